@@ -1,0 +1,90 @@
+#include "PtyPair.h"
+
+#include <QDeadlineTimer>
+#include <QCoreApplication>
+
+#include <cerrno>
+#include <fcntl.h>
+#include <poll.h>
+#include <stdlib.h>
+#include <unistd.h>
+
+PtyPair::PtyPair()
+{
+    m_master = posix_openpt(O_RDWR | O_NOCTTY | O_NONBLOCK);
+    if (m_master < 0)
+        return;
+    if (grantpt(m_master) != 0 || unlockpt(m_master) != 0) {
+        ::close(m_master);
+        m_master = -1;
+        return;
+    }
+    m_slavePath = QString::fromLocal8Bit(ptsname(m_master));
+    // Keep one slave descriptor open so the tty keeps its settings and the
+    // master never sees a hang-up while the code under test reopens it.
+    m_slaveKeepAlive = ::open(ptsname(m_master), O_RDWR | O_NOCTTY | O_NONBLOCK);
+    termios raw {};
+    if (m_slaveKeepAlive >= 0 && tcgetattr(m_slaveKeepAlive, &raw) == 0) {
+        cfmakeraw(&raw);
+        tcsetattr(m_slaveKeepAlive, TCSANOW, &raw);
+    }
+}
+
+PtyPair::~PtyPair()
+{
+    if (m_slaveKeepAlive >= 0)
+        ::close(m_slaveKeepAlive);
+    closeMaster();
+}
+
+bool PtyPair::write(const QByteArray &bytes)
+{
+    qsizetype done = 0;
+    QDeadlineTimer deadline(10000);
+    while (done < bytes.size() && !deadline.hasExpired()) {
+        const ssize_t n = ::write(m_master, bytes.constData() + done, size_t(bytes.size() - done));
+        if (n > 0) {
+            done += n;
+            continue;
+        }
+        if (n < 0 && errno != EAGAIN && errno != EINTR)
+            return false;
+        // The slave's input queue is full: let the code under test read.
+        QCoreApplication::processEvents(QEventLoop::AllEvents, 10);
+        pollfd p { m_master, POLLOUT, 0 };
+        ::poll(&p, 1, 5);
+    }
+    return done == bytes.size();
+}
+
+QByteArray PtyPair::read(int count, int timeoutMs)
+{
+    QByteArray result;
+    QDeadlineTimer deadline(timeoutMs);
+    char chunk[65536];
+    while (result.size() < count && !deadline.hasExpired()) {
+        const ssize_t n = ::read(m_master, chunk, sizeof chunk);
+        if (n > 0) {
+            result.append(chunk, n);
+            continue;
+        }
+        QCoreApplication::processEvents(QEventLoop::AllEvents, 10);
+        pollfd p { m_master, POLLIN, 0 };
+        ::poll(&p, 1, 5);
+    }
+    return result;
+}
+
+termios PtyPair::slaveTermios() const
+{
+    termios t {};
+    tcgetattr(m_slaveKeepAlive, &t);
+    return t;
+}
+
+void PtyPair::closeMaster()
+{
+    if (m_master >= 0)
+        ::close(m_master);
+    m_master = -1;
+}
