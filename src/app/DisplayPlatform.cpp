@@ -1,5 +1,6 @@
 #include "DisplayPlatform.h"
 
+#include <QByteArray>
 #include <QtGlobal>
 
 void chooseOffscreenPlatformWhenHeadless()
