@@ -55,6 +55,8 @@ public:
 Q_SIGNALS:
     // Raised when data has arrived (commEvent() tells what happened).
     void commEventRaised();
+    // Queued bytes went out to the device: the transmit queue has room.
+    void outputWritten();
     // The device failed while open (unplugged adapter, closed pty): the
     // port has been closed and errorString() says why.
     void deviceLost(const QString &description);

@@ -51,6 +51,7 @@ TtySerialPort::TtySerialPort(const PortMap &ports, QObject *parent)
     m_port.setReadBufferSize(8192);
     connect(&m_port, &QSerialPort::readyRead, this, &TtySerialPort::handleReadyRead);
     connect(&m_port, &QSerialPort::errorOccurred, this, &TtySerialPort::handleError);
+    connect(&m_port, &QSerialPort::bytesWritten, this, &SerialPortControl::outputWritten);
 }
 
 TtySerialPort::~TtySerialPort() = default;
