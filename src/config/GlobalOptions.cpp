@@ -1,0 +1,7 @@
+#include "GlobalOptions.h"
+
+GlobalOptions &GlobalOptions::global()
+{
+    static GlobalOptions options;
+    return options;
+}

@@ -1,0 +1,11 @@
+#pragma once
+
+#include <QString>
+
+// Reads a number the way the classic decimal reader does: blanks skipped,
+// an optional sign, digits with an optional fraction and exponent; reading
+// stops at the first character that does not fit. No number at all is 0.
+double leadingNumber(const QString &text);
+
+// The leading number of a text when it is a whole number above 0, else 0.
+int leadingPositiveId(const QString &text);

@@ -1,0 +1,207 @@
+// Serial side to network: receiving from the serial or virtual port into the
+// hold buffer, sending it to the clients immediately or in packets, and the
+// transmit time-out flush.
+#include "SessionEngine.h"
+
+#include "NumberText.h"
+#include "config/GlobalOptions.h"
+#include "platform/SerialPortControl.h"
+#include "platform/SocketMember.h"
+#include "platform/VirtualPortControl.h"
+
+namespace {
+
+constexpr int kDefaultPacketSize = 2000;
+
+qint32 packetSize()
+{
+    const qint32 size = GlobalOptions::global().PacketSize;
+    return size >= 1 ? size : kDefaultPacketSize;
+}
+
+} // namespace
+
+bool SessionEngine::anyConnected() const
+{
+    for (int i = 0; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
+        if (m_sockets[size_t(i)]->state() == SocketMember::StateConnected)
+            return true;
+    }
+    return false;
+}
+
+void SessionEngine::SendToClients(const QByteArray &block)
+{
+    const bool firstOnly = isServer() && m_record.ServerSerialOptions == 2;
+    for (int i = 0; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
+        SocketMember *member = m_sockets[size_t(i)];
+        if (member->state() != SocketMember::StateConnected)
+            continue;
+        member->sendData(block);
+        if (firstOnly)
+            break;
+    }
+}
+
+qint32 SessionEngine::serialReadRoom() const
+{
+    // A peer that does not read must not make memory grow: while one has more
+    // queued than a whole buffer, the serial side waits (its flow control or
+    // the writing application is held back instead).
+    for (int i = 0; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
+        if (m_sockets[size_t(i)]->bytesToWrite() > m_myBuffer.capacity())
+            return 0;
+    }
+    return m_myBuffer.freeSpace();
+}
+
+void SessionEngine::sendHeldData(bool packetMode, bool mayHold)
+{
+    if (m_record.UseUDP) {
+        SocketMember *member = socket(0);
+        if (packetMode) {
+            while (m_myBuffer.count() >= packetSize()) {
+                qint32 n = packetSize();
+                member->sendData(ReadFromMyBuffer(n));
+            }
+        } else if (m_myBuffer.count() > 0) {
+            qint32 n = -1;
+            member->sendData(ReadFromMyBuffer(n));
+        }
+        return;
+    }
+    // With "buffer data" set and nobody connected the bytes stay held.
+    if (mayHold && !anyConnected())
+        return;
+    if (packetMode) {
+        while (m_myBuffer.count() >= packetSize()) {
+            qint32 n = packetSize();
+            SendToClients(ReadFromMyBuffer(n));
+        }
+    } else if (m_myBuffer.count() > 0) {
+        qint32 n = -1;
+        SendToClients(ReadFromMyBuffer(n));
+    }
+}
+
+void SessionEngine::SerialReceive()
+{
+    if (m_inSerialReceive)
+        return;
+    m_inSerialReceive = true;
+    setLamp(0, true);
+    const bool serialIgnored = (isServer() && m_record.ServerSerialOptions == 1)
+        || (!isServer() && m_record.ClientOptions == 2);
+    if (serialIgnored) {
+        m_serialPort->discardInput();
+        m_inSerialReceive = false;
+        return;
+    }
+    const bool connected = anyConnected();
+    if (m_serialPort->commEvent() != SerialPortControl::kCommEventReceive) {
+        m_inSerialReceive = false;
+        return;
+    }
+    const bool mayHold = m_settings.BufferSerialData != 0;
+    if (!m_record.UseUDP && !mayHold && !connected) {
+        m_serialPort->discardInput();
+        m_inSerialReceive = false;
+        return;
+    }
+    const bool packetMode = m_settings.WaitForCr != 0;
+    // Read only what the hold buffer can take; the rest stays in the port
+    // until sending makes room (nothing is read just to be dropped).
+    while (m_serialPort->inBufferCount() > 0) {
+        const qint32 room = serialReadRoom();
+        if (room <= 0)
+            break;
+        Add2MyBuffer(m_serialPort->input(room));
+        sendHeldData(packetMode, mayHold);
+    }
+    if (packetMode && m_serialPort->inBufferCount() == 0)
+        m_record.FlushTicks = 0;
+    m_inSerialReceive = false;
+}
+
+void SessionEngine::VirtualReceive()
+{
+    if (m_inSerialReceive)
+        return;
+    m_inSerialReceive = true;
+    setLamp(0, true);
+    const bool serialIgnored = (isServer() && m_record.ServerSerialOptions == 1)
+        || (!isServer() && m_record.ClientOptions == 2);
+    if (serialIgnored) {
+        m_virtualPort->discardInput();
+        m_inSerialReceive = false;
+        return;
+    }
+    const bool packetMode = m_settings.WaitForCr != 0;
+    // Data from the virtual port is always read; with nobody connected and
+    // nothing to hold for, SendToClients finds no one and it is dropped.
+    const bool mayHold = !m_record.UseUDP && m_settings.BufferSerialData != 0;
+    while (m_virtualPort->available() > 0) {
+        const qint32 room = serialReadRoom();
+        if (room <= 0)
+            break;
+        Add2MyBuffer(m_virtualPort->read(room));
+        sendHeldData(packetMode, mayHold);
+    }
+    if (packetMode)
+        m_record.FlushTicks = 0;
+    m_inSerialReceive = false;
+}
+
+void SessionEngine::resumeSerialReading()
+{
+    if (!isActive() || serialReadRoom() <= 0)
+        return;
+    if (m_settings.CreateVirtualPort == 1) {
+        if (m_virtualPort->available() > 0)
+            VirtualReceive();
+    } else if (m_serialPort->isOpen() && m_serialPort->inBufferCount() > 0) {
+        SerialReceive();
+    }
+}
+
+void SessionEngine::flushOnTimeout()
+{
+    if (m_myBuffer.count() == 0)
+        return;
+    ++m_record.FlushTicks;
+    if (double(m_record.FlushTicks) * kTimer2IntervalMs <= leadingNumber(m_settings.TimeoutValue))
+        return;
+    bool sent = false;
+    if (m_record.UseUDP) {
+        qint32 n = -1;
+        socket(0)->sendData(ReadFromMyBuffer(n));
+        sent = true;
+    } else if (anyConnected()) {
+        qint32 n = -1;
+        SendToClients(ReadFromMyBuffer(n));
+        sent = true;
+    }
+    if (m_settings.BufferSerialData == 0 || sent)
+        m_myBuffer.clear();
+    m_record.FlushTicks = 0;
+}
+
+void SessionEngine::setLamp(int lamp, bool lit)
+{
+    if (m_lampLit[lamp] == lit)
+        return;
+    m_lampLit[lamp] = lit;
+    Q_EMIT lampChanged(lamp, lit);
+}
+
+void SessionEngine::Timer2_Tick()
+{
+    if (++m_ledTicks >= 3) {
+        setLamp(0, false);
+        setLamp(1, false);
+        m_ledTicks = 0;
+    }
+    drainSerialOutput();
+    flushOnTimeout();
+    resumeSerialReading();
+}

@@ -1,0 +1,119 @@
+// Keeping the network side going: client reconnection, accepting clients on
+// a growing socket array, closes and socket errors.
+#include "SessionEngine.h"
+
+#include "localisation/ResourceStrings.h"
+#include "platform/SocketMember.h"
+
+namespace {
+
+constexpr int kNetworkCaption = 5091;
+// The one error number above 10000 that leaves the connection alone.
+constexpr int kHarmlessErrorNumber = 40017;
+// How much an accepted connection reads ahead of the session; the rest
+// stays in the kernel.
+constexpr qint64 kSocketReadAhead = 65536;
+
+} // namespace
+
+void SessionEngine::wireSocket(SocketMember *member)
+{
+    connect(member, &SocketMember::dataArrived, this, [this](int index, qint64) { DataArrival(index); });
+    connect(member, &SocketMember::connected, this, &SessionEngine::handleConnect);
+    connect(member, &SocketMember::connectionRequested, this, &SessionEngine::ConnectionRequest);
+    connect(member, &SocketMember::closed, this, &SessionEngine::handleClose);
+    connect(member, &SocketMember::errorOccurred, this, &SessionEngine::handleSocketError);
+    // A peer that catches up lets the serial side be read again at once.
+    connect(member, &SocketMember::bytesWritten, this, [this](int, qint64) { resumeSerialReading(); });
+    member->setReadBufferSize(kSocketReadAhead);
+}
+
+void SessionEngine::ConnectAttempt()
+{
+    if (m_record.UseUDP)
+        return;
+    SocketMember *member = socket(0);
+    member->setRemoteHost(m_settings.IPAddress);
+    member->setRemotePort(portNumberValue());
+    setStatusLine(NetworkLine, composeStatus(kNetworkCaption, 5097));
+    if (member->connectToRemote())
+        return;
+    const QString description = member->errorString();
+    member->close();
+    member->setRemoteHost(QString());
+    member->setRemotePort(0);
+    setStatusLine(NetworkLine, LoadResString(5083) + description);
+    LogErrors(description);
+}
+
+void SessionEngine::handleConnect(int)
+{
+    m_timer1.stop();
+    setStatusLine(NetworkLine, composeStatus(kNetworkCaption, 5109));
+}
+
+void SessionEngine::showClientCount()
+{
+    if (m_record.ClientCount != 0)
+        setStatusLine(NetworkLine, composeStatus(kNetworkCaption, 5109)
+                                       + QStringLiteral(" (%1)").arg(m_record.ClientCount));
+    else
+        setStatusLine(NetworkLine, composeStatus(kNetworkCaption, 5098));
+}
+
+void SessionEngine::ConnectionRequest(int, qintptr requestId)
+{
+    // A request left alone here is closed by the socket layer at once.
+    if (m_record.AllowMultiConnect == 0 && m_record.ClientCount != 0)
+        return;
+    if (!isServer())
+        return;
+    ++m_record.ClientCount;
+    int chosen = 0;
+    for (int i = 1; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
+        if (socket(i)->state() == SocketMember::StateClosed) {
+            chosen = i;
+            break;
+        }
+    }
+    if (chosen == 0) {
+        chosen = m_record.MaxSocketIndex + 1;
+        m_record.MaxSocketIndex = chosen;
+    }
+    SocketMember *member = createSocketMember(chosen);
+    member->setLocalPort(socket(0)->localPort());
+    if (!member->accept(requestId)) {
+        // Keep running without this client rather than count a ghost; the
+        // closed member is reused by the next request.
+        --m_record.ClientCount;
+        LogErrors(member->errorString());
+        return;
+    }
+    showClientCount();
+}
+
+void SessionEngine::handleClose(int index)
+{
+    if (m_closingNow)
+        return;
+    m_closingNow = true;
+    if (SocketMember *member = socket(index))
+        member->close();
+    m_record.ClientCount = qMax(0, m_record.ClientCount - 1);
+    if (isServer()) {
+        showClientCount();
+    } else {
+        setStatusLine(NetworkLine, composeStatus(kNetworkCaption, 5100));
+        m_timer1.start();
+    }
+    m_closingNow = false;
+}
+
+void SessionEngine::handleSocketError(int index, int number, const QString &description)
+{
+    setStatusLine(NetworkLine, LoadResString(kNetworkCaption) + u' ' + LoadResString(5103));
+    LogErrors(description);
+    const int code = number & 0xFFFF;
+    if (code > 10000 && code != kHarmlessErrorNumber)
+        handleClose(index);
+}

@@ -1,0 +1,167 @@
+#pragma once
+
+#include "SessionBuffer.h"
+#include "SessionPlatform.h"
+#include "SessionRecord.h"
+#include "SessionSettings.h"
+
+#include <QObject>
+#include <QStringList>
+#include <QTimer>
+
+#include <vector>
+
+class SerialPortControl;
+class SocketMember;
+class VirtualPortControl;
+
+// One bridge between a serial connector and a network endpoint: its
+// settings, run-time record, platform controls and the texts its window
+// shows. It holds no widget, so it runs the same with or without a display.
+class SessionEngine : public QObject
+{
+    Q_OBJECT
+public:
+    enum StatusLine { ComLine = 0, NetworkLine = 1 };
+
+    explicit SessionEngine(SessionPlatform platform, QObject *parent = nullptr);
+    ~SessionEngine() override;
+
+    SessionSettings &settings() { return m_settings; }
+    const SessionSettings &settings() const { return m_settings; }
+    SessionRecord &record() { return m_record; }
+    const SessionRecord &record() const { return m_record; }
+
+    SerialPortControl *serialPort() const { return m_serialPort; }
+    VirtualPortControl *virtualPort() const { return m_virtualPort; }
+    // Member i of the socket array; nullptr beyond the members created.
+    SocketMember *socket(int index) const;
+    int socketCount() const { return int(m_sockets.size()); }
+    // Creates members up to `index` (a closed member with default
+    // properties), keeps existing ones, returns member `index`.
+    SocketMember *createSocketMember(int index);
+
+    QString statusLine(StatusLine line) const { return m_statusLines[line]; }
+    // Changes a status line; statusLineChanged is raised only when the text
+    // really changes, so every visible change is reported exactly once.
+    void setStatusLine(StatusLine line, const QString &text);
+
+    QString caption() const { return m_caption; }
+    void setCaption(const QString &caption);
+    // The name under which the command channel reaches this session.
+    QString commandTopic() const { return m_commandTopic; }
+    void setCommandTopic(const QString &topic);
+
+    // The Activate button's caption: the session is active exactly while it
+    // reads "De-Activate".
+    QString activateCaption() const { return m_activateCaption; }
+    void setActivateCaption(const QString &caption);
+    bool isActive() const;
+    bool settingsLocked() const { return m_settingsLocked; }
+    void setSettingsLocked(bool locked);
+
+    // Copy the routing options and login texts to / from the application's
+    // options transfer variables.
+    void Getstatus() const;
+    void UpdateStatus();
+
+    // Remote addresses of the connected members, in index order.
+    QStringList connectedClientAddresses() const;
+
+    // Activate / De-Activate: a toggle decided by the button's caption.
+    void Command1_Click();
+
+    // The two data buffers (hold buffer: serial to network; serial output
+    // buffer: network to serial). Adds take what fits and return how much.
+    qint32 Add2MyBuffer(QByteArrayView data) { return m_myBuffer.add(data); }
+    QByteArray ReadFromMyBuffer(qint32 &numBytes) { return m_myBuffer.read(numBytes); }
+    qint32 Add2SerialOutBuffer(QByteArrayView data) { return m_serialOutBuffer.add(data); }
+    QByteArray ReadFromSerialOutBuffer(qint32 &numBytes) { return m_serialOutBuffer.read(numBytes); }
+    const SessionBuffer &myBuffer() const { return m_myBuffer; }
+    const SessionBuffer &serialOutBuffer() const { return m_serialOutBuffer; }
+
+    // Sends one block to the connected members by the routing options.
+    void SendToClients(const QByteArray &block);
+    // Writes one line to the error log and starts the error program.
+    void LogErrors(const QString &message);
+
+    // Activity lamps: 0 serial side, 1 network side; true while lit red.
+    bool lampLit(int lamp) const { return m_lampLit[lamp]; }
+    bool isReconnecting() const { return m_timer1.isActive(); }
+
+    // Timer handlers, public so tests can drive them tick by tick.
+    void Timer2_Tick();
+    void ConnectAttempt();
+
+    static constexpr int kTimer1IntervalMs = 5000;
+    static constexpr int kTimer2IntervalMs = 50;
+
+Q_SIGNALS:
+    void statusLineChanged(int line, const QString &text);
+    void captionChanged(const QString &caption);
+    void commandTopicChanged(const QString &topic);
+    void activateCaptionChanged(const QString &caption);
+    void settingsLockChanged(bool locked);
+    void lampChanged(int lamp, bool lit);
+
+private:
+    // Activation and deactivation.
+    void activate();
+    void deactivate();
+    bool openPhysicalPort();
+    void failSerialOpen(const QString &description);
+    void failSocketStart(const QString &description);
+    void closeSerialSide();
+    bool sizeBuffers();
+    QString composeStatus(int captionId, int stateId, const QString &detail = {}) const;
+
+    // Serial to network.
+    void SerialReceive();
+    void VirtualReceive();
+    void VirtualOpenClose(bool opened);
+    qint32 serialReadRoom() const;
+    void sendHeldData(bool packetMode, bool mayHold);
+    void flushOnTimeout();
+    void resumeSerialReading();
+    void setLamp(int lamp, bool lit);
+
+    // Network to serial.
+    void DataArrival(int index);
+    void drainSerialOutput();
+    void resumeNetworkReading();
+    int firstConnectedIndex() const;
+
+    // Connections.
+    void handleConnect(int index);
+    void ConnectionRequest(int index, qintptr requestId);
+    void handleClose(int index);
+    void handleSocketError(int index, int number, const QString &description);
+    void wireSocket(SocketMember *member);
+    bool anyConnected() const;
+    bool isServer() const { return m_record.TCPOption == 1; }
+    int portNumberValue() const;
+    void showClientCount();
+
+    void wirePlatform();
+
+    SessionPlatform m_platform;
+    SessionSettings m_settings;
+    SessionRecord m_record;
+    SerialPortControl *m_serialPort = nullptr;
+    VirtualPortControl *m_virtualPort = nullptr;
+    std::vector<SocketMember *> m_sockets;
+    QString m_statusLines[2];
+    QString m_caption;
+    QString m_commandTopic;
+    QString m_activateCaption;
+    bool m_settingsLocked = false;
+
+    SessionBuffer m_myBuffer;
+    SessionBuffer m_serialOutBuffer;
+    QTimer m_timer1;
+    QTimer m_timer2;
+    bool m_lampLit[2] = { false, false };
+    int m_ledTicks = 0;
+    bool m_closingNow = false;
+    bool m_inSerialReceive = false;
+};

@@ -1,0 +1,287 @@
+#include "SessionWindow.h"
+#include "ui_SessionWindow.h"
+
+#include "NumberText.h"
+#include "OptionsTransfer.h"
+#include "SessionEngine.h"
+#include "UserDialogs.h"
+#include "localisation/ApplyResourceStrings.h"
+#include "localisation/ResourceStrings.h"
+#include "platform/LocalAddresses.h"
+#include "platform/SocketMember.h"
+
+#include <QEvent>
+
+namespace {
+
+constexpr int kHighestPort = 65535;
+
+void fillFromIds(QComboBox *box, const auto &ids)
+{
+    for (int id : ids)
+        box->addItem(LoadResString(id));
+}
+
+} // namespace
+
+SessionWindow::SessionWindow(SessionEngine *engine, QWidget *parent)
+    : QWidget(parent), m_ui(std::make_unique<Ui::SessionWindow>()), m_engine(engine)
+{
+    m_ui->setupUi(this);
+    layout()->setSizeConstraint(QLayout::SetFixedSize);
+
+    ApplyResourceStrings(this);
+    PingTimeoutMs = 1000;
+    fillLists();
+    takeLocalAddress();
+    m_engine->record().AllowMultiConnect = 1;
+    m_engine->record().ConnectOnVirtualOpen = 1;
+
+    bindSettings();
+    bindEngine();
+    m_ui->Frame2->installEventFilter(this);
+}
+
+SessionWindow::~SessionWindow() = default;
+
+void SessionWindow::fillLists()
+{
+    for (int n = 0; n < SessionLists::kConnectorCount; ++n)
+        m_ui->Combo2->addItem(SessionLists::connectorName(n));
+    m_ui->Combo2->setCurrentIndex(0);
+    m_ui->Combo1_0->addItems(SessionLists::kBaudRates);
+    m_ui->Combo1_0->setCurrentIndex(6);
+    fillFromIds(m_ui->Combo1_1, SessionLists::kParityIds);
+    m_ui->Combo1_1->setCurrentIndex(0);
+    m_ui->Combo1_2->addItems(SessionLists::kDataBits);
+    m_ui->Combo1_2->setCurrentIndex(3);
+    m_ui->Combo1_3->addItems(SessionLists::kStopBits);
+    m_ui->Combo1_3->setCurrentIndex(0);
+    fillFromIds(m_ui->Combo1_4, SessionLists::kFlowControlIds);
+    m_ui->Combo1_4->setCurrentIndex(0);
+    m_ui->Combo1_5->addItems(SessionLists::kBufferSizes);
+    m_ui->Combo1_5->setCurrentIndex(2);
+}
+
+void SessionWindow::takeLocalAddress()
+{
+    m_ui->LocalIP->addItems(localIPv4Addresses());
+    SessionRecord &record = m_engine->record();
+    record.LocalIPAddress = m_engine->socket(0)->localIP();
+    if (record.LocalIPAddress.isEmpty()) {
+        // Without an address of its own the machine cannot serve.
+        m_ui->TCPOption_1->setEnabled(false);
+        record.TCPOption = 0;
+    } else {
+        m_ui->LocalIP->setEditText(record.LocalIPAddress);
+        m_ui->TCPOption_1->setEnabled(true);
+    }
+    m_engine->settings().LocalIP = m_ui->LocalIP->currentText();
+    TCPOption_Click(0);
+}
+
+void SessionWindow::bindSettings()
+{
+    SessionSettings &s = m_engine->settings();
+    auto bindList = [this](QComboBox *box, int SessionSettings::*field) {
+        m_engine->settings().*field = box->currentIndex();
+        connect(box, &QComboBox::currentIndexChanged, this,
+                [this, field](int index) { m_engine->settings().*field = index; });
+    };
+    bindList(m_ui->Combo1_0, &SessionSettings::BaudRate);
+    bindList(m_ui->Combo1_1, &SessionSettings::Parity);
+    bindList(m_ui->Combo1_2, &SessionSettings::Databits);
+    bindList(m_ui->Combo1_3, &SessionSettings::Stopbits);
+    bindList(m_ui->Combo1_4, &SessionSettings::FlowControl);
+    bindList(m_ui->Combo1_5, &SessionSettings::BufferSize);
+
+    s.Connector = m_ui->Combo2->currentIndex();
+    s.ConnectorText = m_ui->Combo2->currentText();
+    connect(m_ui->Combo2, &QComboBox::activated, this, &SessionWindow::Combo2_Click);
+    connect(m_ui->Combo2, &QComboBox::editTextChanged, this, &SessionWindow::Combo2_EditTextChanged);
+
+    auto bindCheck = [this](QAbstractButton *box, int SessionSettings::*field) {
+        m_engine->settings().*field = box->isChecked() ? 1 : 0;
+        connect(box, &QAbstractButton::toggled, this,
+                [this, field](bool on) { m_engine->settings().*field = on ? 1 : 0; });
+    };
+    bindCheck(m_ui->BufferSerData, &SessionSettings::BufferSerialData);
+    bindCheck(m_ui->chkVPort, &SessionSettings::CreateVirtualPort);
+    bindCheck(m_ui->chkUDP, &SessionSettings::UseUDP);
+    bindCheck(m_ui->WaitForCr, &SessionSettings::WaitForCr);
+    bindCheck(m_ui->TCPOption_1, &SessionSettings::TCPOption);
+    connect(m_ui->TCPOption_0, &QRadioButton::toggled, this, [this](bool on) {
+        if (on)
+            TCPOption_Click(0);
+    });
+    connect(m_ui->TCPOption_1, &QRadioButton::toggled, this, [this](bool on) {
+        if (on)
+            TCPOption_Click(1);
+    });
+
+    auto bindText = [this](QLineEdit *edit, QString SessionSettings::*field) {
+        m_engine->settings().*field = edit->text();
+        connect(edit, &QLineEdit::textChanged, this,
+                [this, field](const QString &text) { m_engine->settings().*field = text; });
+    };
+    bindText(m_ui->IPAddress, &SessionSettings::IPAddress);
+    bindText(m_ui->PortNumber, &SessionSettings::PortNumber);
+    bindText(m_ui->txtTimeoutValue, &SessionSettings::TimeoutValue);
+    connect(m_ui->PortNumber, &QLineEdit::textChanged, this, &SessionWindow::PortNumber_Change);
+    connect(m_ui->LocalIP, &QComboBox::currentTextChanged, this,
+            [this](const QString &text) { m_engine->settings().LocalIP = text; });
+
+    connect(m_ui->Command2, &QPushButton::clicked, this, &SessionWindow::Command2_Click);
+    connect(m_ui->Command3, &QPushButton::clicked, this, &SessionWindow::Command3_Click);
+    connect(m_ui->btnLogin, &QPushButton::clicked, this, &SessionWindow::btnLogin_Click);
+}
+
+void SessionWindow::bindEngine()
+{
+    auto showStatus = [this](int line, const QString &text) {
+        (line == SessionEngine::ComLine ? m_ui->StatusBar1_0 : m_ui->StatusBar1_1)->setText(text);
+    };
+    showStatus(SessionEngine::ComLine, m_engine->statusLine(SessionEngine::ComLine));
+    showStatus(SessionEngine::NetworkLine, m_engine->statusLine(SessionEngine::NetworkLine));
+    connect(m_engine, &SessionEngine::statusLineChanged, this, showStatus);
+
+    setWindowTitle(m_engine->caption());
+    connect(m_engine, &SessionEngine::captionChanged, this, &QWidget::setWindowTitle);
+
+    m_ui->Command1->setText(m_engine->activateCaption());
+    connect(m_engine, &SessionEngine::activateCaptionChanged, m_ui->Command1, &QPushButton::setText);
+
+    auto showLamp = [this](int lamp, bool lit) {
+        // Red while traffic was seen in the last ticks, green otherwise.
+        (lamp == 0 ? m_ui->Shape1_0 : m_ui->Shape1_1)
+            ->setStyleSheet(QStringLiteral("background-color: %1; border: 1px solid #404040; border-radius: 6px;")
+                                .arg(lit ? QStringLiteral("#ff0000") : QStringLiteral("#00ff00")));
+    };
+    showLamp(0, m_engine->lampLit(0));
+    showLamp(1, m_engine->lampLit(1));
+    connect(m_engine, &SessionEngine::lampChanged, this, showLamp);
+    connect(m_ui->Command1, &QPushButton::clicked, m_engine, &SessionEngine::Command1_Click);
+
+    applyLock(m_engine->settingsLocked());
+    connect(m_engine, &SessionEngine::settingsLockChanged, this, &SessionWindow::applyLock);
+}
+
+void SessionWindow::applyLock(bool locked)
+{
+    const QList<QWidget *> settingControls { m_ui->Combo2, m_ui->Combo1_0, m_ui->Combo1_1,
+        m_ui->Combo1_2, m_ui->Combo1_3, m_ui->Combo1_4, m_ui->Combo1_5, m_ui->Command2,
+        m_ui->TCPOption_0, m_ui->TCPOption_1, m_ui->IPAddress, m_ui->PortNumber, m_ui->LocalIP,
+        m_ui->chkVPort, m_ui->chkUDP };
+    for (QWidget *control : settingControls)
+        control->setEnabled(!locked);
+    // The server role stays unavailable on a machine without an address.
+    if (!locked && m_engine->record().LocalIPAddress.isEmpty())
+        m_ui->TCPOption_1->setEnabled(false);
+}
+
+void SessionWindow::TCPOption_Click(int index)
+{
+    const bool client = index == 0;
+    m_ui->IPAddress->setVisible(client);
+    m_ui->LocalIP->setVisible(!client);
+    m_ui->Label2->setText(LoadResString(client ? 5104 : 5106));
+    m_ui->Label3->setText(LoadResString(client ? 5105 : 5107));
+}
+
+void SessionWindow::PortNumber_Change(const QString &text)
+{
+    if (leadingNumber(text) <= kHighestPort)
+        return;
+    UserDialogs::showMessage({ this, LoadResString(5102), LoadResString(5103), UserDialogs::Icon::None });
+}
+
+void SessionWindow::Combo2_Click(int index)
+{
+    m_engine->setCommandTopic(m_ui->Combo2->itemText(index));
+}
+
+void SessionWindow::Combo2_EditTextChanged(const QString &text)
+{
+    // Typed text that names no entry leaves the session without a chosen
+    // connector, like a list whose selection was cleared.
+    SessionSettings &s = m_engine->settings();
+    s.ConnectorText = text;
+    const int index = m_ui->Combo2->currentIndex();
+    s.Connector = index >= 0 && m_ui->Combo2->itemText(index) == text ? index : -1;
+}
+
+void SessionWindow::Command2_Click()
+{
+    OptionsTransfer &t = OptionsTransfer::global();
+    SessionRecord &r = m_engine->record();
+    if (m_ui->TCPOption_1->isChecked()) {
+        t.AllowMultiConnect = r.AllowMultiConnect;
+        t.ServerSerialOptions = r.ServerSerialOptions;
+        t.ServerTCPOptions = r.ServerTCPOptions;
+        if (showIOOptionsDialog)
+            showIOOptionsDialog(true);
+        if (t.AllowMultiConnect == OptionsTransfer::kCancelled)
+            return;
+        r.AllowMultiConnect = t.AllowMultiConnect;
+        r.ServerSerialOptions = t.ServerSerialOptions;
+        r.ServerTCPOptions = t.ServerTCPOptions;
+        return;
+    }
+    t.ClientOptions = r.ClientOptions;
+    t.ConnectOnVirtualOpen = r.ConnectOnVirtualOpen;
+    if (showIOOptionsDialog)
+        showIOOptionsDialog(false);
+    if (t.ClientOptions == OptionsTransfer::kCancelled)
+        return;
+    r.ClientOptions = t.ClientOptions;
+    r.ConnectOnVirtualOpen = t.ConnectOnVirtualOpen;
+}
+
+void SessionWindow::btnLogin_Click()
+{
+    OptionsTransfer &t = OptionsTransfer::global();
+    SessionRecord &r = m_engine->record();
+    t.UserPrompt = r.UserPrompt;
+    t.UserPromptResponse = r.UserPromptResponse;
+    t.PasswordPrompt = r.PasswordPrompt;
+    t.PasswordPromptResponse = r.PasswordPromptResponse;
+    t.LoginCancel = 0;
+    if (showLoginOptionsDialog)
+        showLoginOptionsDialog();
+    if (t.LoginCancel != 0)
+        return;
+    r.UserPrompt = t.UserPrompt;
+    r.UserPromptResponse = t.UserPromptResponse;
+    r.PasswordPrompt = t.PasswordPrompt;
+    r.PasswordPromptResponse = t.PasswordPromptResponse;
+}
+
+void SessionWindow::Command3_Click()
+{
+    const auto answer = UserDialogs::askText({ this,
+        QStringLiteral("Enter an optional name or description for this session window. The name that "
+                       "you enter will appear in the title bar of the current session window and in the "
+                       "Window list on the Velloca main menu."),
+        QStringLiteral("Set Window Name"), m_engine->caption() });
+    if (!answer || answer->isEmpty())
+        return;
+    m_engine->settings().SessionDescription = *answer;
+    m_engine->setCaption(*answer);
+}
+
+void SessionWindow::Frame2_DblClick()
+{
+    if (m_ui->TCPOption_0->isChecked())
+        return;
+    QString text;
+    for (const QString &address : m_engine->connectedClientAddresses())
+        text += address + QStringLiteral("\r\n");
+    UserDialogs::showMessage({ this, text, LoadResString(5101), UserDialogs::Icon::None });
+}
+
+bool SessionWindow::eventFilter(QObject *watched, QEvent *event)
+{
+    if (watched == m_ui->Frame2 && event->type() == QEvent::MouseButtonDblClick)
+        Frame2_DblClick();
+    return QWidget::eventFilter(watched, event);
+}

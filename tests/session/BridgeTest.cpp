@@ -1,0 +1,317 @@
+#include "BridgeFixture.h"
+
+#include "platform/SerialPortControl.h"
+
+#include <QFile>
+#include <QRegularExpression>
+
+namespace {
+
+QStringList logLines(const QTemporaryDir &folder)
+{
+    QFile log(folder.filePath(QStringLiteral("errorlog.txt")));
+    if (!log.open(QIODevice::ReadOnly))
+        return {};
+    const QString text = QString::fromUtf8(log.readAll());
+    QStringList lines = text.split(QStringLiteral("\r\n"));
+    if (!lines.isEmpty() && lines.last().isEmpty())
+        lines.removeLast();
+    return lines;
+}
+
+TEST_F(BridgeTest, ServerSessionCarriesOneMiBBothWaysAtOnce)
+{
+    activateServer();
+    EXPECT_EQ(engine->statusLine(SessionEngine::ComLine), QStringLiteral("COM Status: Open"));
+    EXPECT_EQ(engine->statusLine(SessionEngine::NetworkLine), QStringLiteral("TCP/IP Status: Listening..."));
+    EXPECT_EQ(engine->caption(), QStringLiteral("COM7 - RS232 to TCP/IP"));
+    EXPECT_TRUE(engine->settingsLocked());
+    auto client = connectClient();
+    EXPECT_EQ(engine->statusLine(SessionEngine::NetworkLine), QStringLiteral("TCP/IP Status: Connected (1)"));
+
+    const QByteArray toNetwork = randomBytes(1 << 20);
+    const QByteArray toSerial = randomBytes((1 << 20) + 1);
+    client->write(toSerial);
+    ASSERT_TRUE(pty.write(toNetwork));
+    EXPECT_TRUE(readSocket(*client, toNetwork.size()) == toNetwork);
+    EXPECT_TRUE(pty.read(toSerial.size(), 30000) == toSerial);
+
+    engine->Command1_Click();
+    EXPECT_FALSE(engine->isActive());
+    EXPECT_EQ(engine->statusLine(SessionEngine::ComLine), QStringLiteral("COM Status: Closed"));
+    EXPECT_EQ(engine->statusLine(SessionEngine::NetworkLine), QStringLiteral("TCP/IP Status: Closed"));
+    EXPECT_EQ(engine->activateCaption(), QStringLiteral("Activate"));
+    EXPECT_FALSE(engine->settingsLocked());
+    EXPECT_EQ(engine->record().ClientCount, 0);
+    EXPECT_TRUE(waitUntil([&] { return client->state() == QAbstractSocket::UnconnectedState; }));
+}
+
+TEST_F(BridgeTest, ClientSessionCarriesOneMiBBothWays)
+{
+    QTcpServer server;
+    ASSERT_TRUE(server.listen(QHostAddress::LocalHost, 0));
+    engine->settings().PortNumber = QString::number(server.serverPort());
+    engine->Command1_Click();
+    ASSERT_TRUE(engine->isActive());
+    ASSERT_TRUE(waitUntil([&] { return server.hasPendingConnections(); }));
+    std::unique_ptr<QTcpSocket> peer(server.nextPendingConnection());
+    ASSERT_TRUE(waitUntil([&] {
+        return engine->statusLine(SessionEngine::NetworkLine) == QStringLiteral("TCP/IP Status: Connected");
+    }));
+
+    const QByteArray toNetwork = randomBytes(1 << 20);
+    const QByteArray toSerial = randomBytes(1 << 20);
+    peer->write(toSerial);
+    ASSERT_TRUE(pty.write(toNetwork));
+    EXPECT_TRUE(readSocket(*peer, toNetwork.size()) == toNetwork);
+    EXPECT_TRUE(pty.read(toSerial.size(), 30000) == toSerial);
+}
+
+TEST_F(BridgeTest, SerialDataIsHeldWhileNoClientIsConnectedOnlyWhenAsked)
+{
+    // Without "buffer data" serial bytes that find no client are discarded.
+    activateServer();
+    ASSERT_TRUE(pty.write("lost"));
+    ASSERT_TRUE(waitUntil([&] { return engine->lampLit(0); }));
+    engine->Command1_Click();
+
+    engine->settings().BufferSerialData = 1;
+    activateServer();
+    ASSERT_TRUE(pty.write("kept for later"));
+    ASSERT_TRUE(waitUntil([&] { return engine->myBuffer().count() == 14; }));
+    auto client = connectClient();
+    EXPECT_EQ(readSocket(*client, 14), QByteArray("kept for later"));
+}
+
+TEST_F(BridgeTest, FirstClientOnlyFollowsTheLowestIndexAfterReuse)
+{
+    engine->record().ServerSerialOptions = 2;
+    engine->record().ServerTCPOptions = 2;
+    activateServer();
+    auto first = connectClient();  // index 1
+    auto second = connectClient(); // index 2
+    EXPECT_EQ(engine->statusLine(SessionEngine::NetworkLine), QStringLiteral("TCP/IP Status: Connected (2)"));
+
+    ASSERT_TRUE(pty.write("to first"));
+    EXPECT_EQ(readSocket(*first, 8), QByteArray("to first"));
+    second->write("dropped");
+    first->write("written");
+    EXPECT_EQ(pty.read(7), QByteArray("written"));
+
+    first->disconnectFromHost();
+    ASSERT_TRUE(waitUntil([&] { return engine->record().ClientCount == 1; }));
+    auto third = connectClient(); // reuses index 1
+    EXPECT_EQ(engine->record().MaxSocketIndex, 2);
+    ASSERT_TRUE(pty.write("to newest"));
+    EXPECT_EQ(readSocket(*third, 9), QByteArray("to newest"));
+    EXPECT_TRUE(second->readAll().isEmpty());
+}
+
+TEST_F(BridgeTest, IgnoreOptionsDropDataInTheirDirection)
+{
+    engine->record().ServerSerialOptions = 1;
+    engine->record().ServerTCPOptions = 1;
+    activateServer();
+    auto client = connectClient();
+    client->write("never reaches the serial side");
+    ASSERT_TRUE(waitUntil([&] { return engine->lampLit(1); }));
+    ASSERT_TRUE(pty.write("never reaches the network"));
+    ASSERT_TRUE(waitUntil([&] { return engine->lampLit(0); }));
+    // A marker through a second session would need more set-up; instead the
+    // buffers show that nothing was kept for either side.
+    EXPECT_EQ(engine->serialOutBuffer().count(), 0);
+    EXPECT_EQ(engine->myBuffer().count(), 0);
+    EXPECT_TRUE(pty.read(1, 300).isEmpty());
+    EXPECT_TRUE(client->readAll().isEmpty());
+}
+
+TEST_F(BridgeTest, SingleClientServerKeepsTheSecondClientOut)
+{
+    engine->record().AllowMultiConnect = 0;
+    activateServer();
+    auto first = connectClient();
+    QTcpSocket second;
+    second.connectToHost(QStringLiteral("127.0.0.1"), quint16(serverPort()));
+    // The request is closed at once by the socket layer, not left waiting.
+    EXPECT_TRUE(waitUntil([&] { return second.state() == QAbstractSocket::UnconnectedState; }));
+    EXPECT_EQ(engine->record().ClientCount, 1);
+    ASSERT_TRUE(pty.write("only one"));
+    EXPECT_EQ(readSocket(*first, 8), QByteArray("only one"));
+}
+
+TEST_F(BridgeTest, SlowSerialSideLosesNothingOfFourMiB)
+{
+    activateServer();
+    auto client = connectClient();
+    const QByteArray payload = randomBytes(4 << 20);
+    client->write(payload);
+    // Nobody reads the serial side for a while: the data must wait in the
+    // socket, not be dropped when the session's buffers are full.
+    ASSERT_TRUE(waitUntil([&] { return engine->serialOutBuffer().count() == engine->serialOutBuffer().capacity(); }));
+    QTest::qWait(500);
+    EXPECT_TRUE(pty.read(payload.size(), 60000) == payload);
+}
+
+TEST_F(BridgeTest, ClientReconnectsAfterTheServerComesBack)
+{
+    const int port = freePort();
+    engine->settings().PortNumber = QString::number(port);
+    engine->Command1_Click();
+    ASSERT_TRUE(engine->isActive());
+    // Nothing listens: the refusal closes the socket and starts the retry timer.
+    ASSERT_TRUE(waitUntil([&] { return engine->isReconnecting(); }));
+    EXPECT_EQ(engine->statusLine(SessionEngine::NetworkLine), QStringLiteral("TCP/IP Status: Closed"));
+
+    QTcpServer server;
+    ASSERT_TRUE(server.listen(QHostAddress::LocalHost, quint16(port)));
+    ASSERT_TRUE(waitUntil([&] { return server.hasPendingConnections(); }, 15000)) << "one retry every 5 s";
+    ASSERT_TRUE(waitUntil([&] { return !engine->isReconnecting(); }));
+    std::unique_ptr<QTcpSocket> peer(server.nextPendingConnection());
+
+    // The server goes away again: the session retries until it is back.
+    peer->abort();
+    ASSERT_TRUE(waitUntil([&] { return engine->isReconnecting(); }));
+    engine->ConnectAttempt();
+    ASSERT_TRUE(waitUntil([&] { return server.hasPendingConnections(); }));
+    ASSERT_TRUE(waitUntil([&] {
+        return engine->statusLine(SessionEngine::NetworkLine) == QStringLiteral("TCP/IP Status: Connected");
+    }));
+}
+
+TEST_F(BridgeTest, ActivationRefusalsTouchNothing)
+{
+    engine->settings().IPAddress.clear();
+    engine->Command1_Click();
+    EXPECT_EQ(engine->statusLine(SessionEngine::NetworkLine), QStringLiteral("TCP/IP Status: Error - Invalid IP Address"));
+    EXPECT_FALSE(engine->isActive());
+
+    engine->settings().IPAddress = QStringLiteral("127.0.0.1");
+    for (const char *bad : { "65536", "-1" }) {
+        engine->settings().PortNumber = QString::fromLatin1(bad);
+        engine->Command1_Click();
+        EXPECT_EQ(engine->statusLine(SessionEngine::NetworkLine),
+                  QStringLiteral("TCP/IP Status: Error - Invalid Port Number")) << bad;
+        EXPECT_FALSE(engine->isActive());
+    }
+
+    engine->settings().PortNumber = QStringLiteral("1000");
+    engine->settings().Connector = 0;
+    engine->Command1_Click();
+    EXPECT_EQ(engine->caption(), QStringLiteral("New - RS232 to TCP/IP"));
+    EXPECT_EQ(engine->statusLine(SessionEngine::ComLine), QStringLiteral("COM Status:"));
+    EXPECT_EQ(engine->statusLine(SessionEngine::NetworkLine), QStringLiteral("TCP/IP Status:"));
+    EXPECT_FALSE(engine->isActive());
+
+    // A device that does not exist: the reason is on the COM line.
+    engine->settings().Connector = 9;
+    PortMap::global().setDevice(9, folder.filePath(QStringLiteral("ttyUSB9")));
+    engine->Command1_Click();
+    EXPECT_TRUE(engine->statusLine(SessionEngine::ComLine).startsWith(QStringLiteral("COM Status: Error - ")));
+    EXPECT_TRUE(engine->statusLine(SessionEngine::ComLine).contains(QStringLiteral("ttyUSB9")));
+    EXPECT_FALSE(engine->isActive());
+
+    // A port already in use by another server closes the serial side again.
+    QTcpServer occupier;
+    ASSERT_TRUE(occupier.listen(QHostAddress::LocalHost, 0));
+    engine->settings().Connector = kCom;
+    engine->settings().TCPOption = 1;
+    engine->settings().PortNumber = QString::number(occupier.serverPort());
+    engine->Command1_Click();
+    EXPECT_FALSE(engine->isActive());
+    EXPECT_TRUE(engine->statusLine(SessionEngine::NetworkLine).startsWith(QStringLiteral("TCP/IP Status: Error - ")));
+    EXPECT_EQ(engine->statusLine(SessionEngine::ComLine), QStringLiteral("COM Status: Closed"));
+}
+
+TEST_F(BridgeTest, SerialSettingsAndFlowControlReachTheDevice)
+{
+    SessionSettings &s = engine->settings();
+    s.BaudRate = 8;    // 19200
+    s.Parity = 1;      // Even
+    s.Databits = 2;    // 7
+    s.Stopbits = 2;    // 2
+    s.FlowControl = 3; // Opto-RS: hardware handshaking
+    activateServer();
+    EXPECT_EQ(engine->serialPort()->settings(), QStringLiteral("19200,E,7,2"));
+    EXPECT_EQ(engine->serialPort()->handshaking(), int(SerialPortControl::RtsCts));
+    const termios t = pty.slaveTermios();
+    EXPECT_EQ(cfgetospeed(&t), speed_t(B19200));
+    EXPECT_TRUE(t.c_cflag & CSTOPB);
+    EXPECT_TRUE(t.c_cflag & CRTSCTS);
+}
+
+TEST_F(BridgeTest, VirtualPortBranchCreatesAndRemovesThePort)
+{
+    engine->settings().CreateVirtualPort = 1;
+    engine->settings().Connector = 5;
+    engine->settings().ConnectorText = QStringLiteral("COM5");
+    engine->settings().PortNumber = QString::number(freePort());
+    engine->Command1_Click();
+    ASSERT_TRUE(engine->isActive());
+    EXPECT_EQ(engine->statusLine(SessionEngine::ComLine), QStringLiteral("Virtual Port COM5 created"));
+    // A client that waits for the application to open the port does not
+    // connect yet and leaves the network line as it was.
+    EXPECT_EQ(engine->statusLine(SessionEngine::NetworkLine), QStringLiteral("TCP/IP Status:"));
+    const QString link = folder.filePath(QStringLiteral("ports/COM5"));
+    EXPECT_TRUE(QFileInfo(link).isSymLink());
+
+    engine->Command1_Click();
+    EXPECT_FALSE(engine->isActive());
+    EXPECT_EQ(engine->statusLine(SessionEngine::ComLine), QStringLiteral("Virtual port closed"));
+    EXPECT_FALSE(QFileInfo::exists(link));
+
+    // Something else in the way of the link: creation is refused, nothing opens.
+    QFile blocker(link);
+    ASSERT_TRUE(blocker.open(QIODevice::WriteOnly));
+    blocker.close();
+    engine->Command1_Click();
+    EXPECT_FALSE(engine->isActive());
+    EXPECT_TRUE(engine->statusLine(SessionEngine::ComLine).startsWith(QStringLiteral("Cannot create virtual COM5")));
+}
+
+TEST_F(BridgeTest, UnpluggedDeviceIsReportedAndTheSessionRecovers)
+{
+    activateServer();
+    pty.closeMaster();
+    ASSERT_TRUE(waitUntil([&] { return engine->statusLine(SessionEngine::ComLine).startsWith(QStringLiteral("COM Status: Error - ")); }));
+    EXPECT_TRUE(engine->isActive());
+    engine->Command1_Click();
+    EXPECT_EQ(engine->statusLine(SessionEngine::ComLine), QStringLiteral("COM Status: Closed"));
+
+    PtyPair replacement;
+    PortMap::global().setDevice(kCom, replacement.slavePath());
+    activateServer();
+    auto client = connectClient();
+    ASSERT_TRUE(replacement.write("back again"));
+    EXPECT_EQ(readSocket(*client, 10), QByteArray("back again"));
+}
+
+TEST_F(BridgeTest, ErrorLogRecordsEveryStatusChangeWithTheRole)
+{
+    GlobalOptions::global().LogErrors = 1;
+    activateServer();
+    // Each change is one line; the role and port are those in force when
+    // the line is written, so the last one shows the listening server.
+    const QRegularExpression line(QStringLiteral(
+        "^Velloca Error: (.*), \\d\\d-\\d\\d-\\d{4}, \\d\\d:\\d\\d:\\d\\d, Velloca IP Address: 127\\.0\\.0\\.1, (.*)$"));
+    QStringList messages;
+    for (const QString &text : logLines(folder)) {
+        const auto match = line.match(text);
+        EXPECT_TRUE(match.hasMatch()) << text.toStdString();
+        messages << match.captured(1);
+    }
+    EXPECT_EQ(messages, (QStringList { "COM Status: Open", "TCP/IP Status: Listening..." }));
+    EXPECT_TRUE(logLines(folder).last().endsWith(QStringLiteral("Server Mode, Local Port: %1").arg(serverPort())));
+    engine->Command1_Click();
+
+    QTcpServer server;
+    ASSERT_TRUE(server.listen(QHostAddress::LocalHost, 0));
+    engine->settings().TCPOption = 0;
+    engine->settings().PortNumber = QString::number(server.serverPort());
+    engine->Command1_Click();
+    ASSERT_TRUE(waitUntil([&] { return logLines(folder).last().contains(QStringLiteral("Status: Connected,")); }));
+    EXPECT_TRUE(logLines(folder).last().endsWith(
+        QStringLiteral(", Velloca IP Address: 127.0.0.1, Client Mode, Remote Host: 127.0.0.1, RemotePort: %1")
+            .arg(server.serverPort())));
+}
+
+} // namespace
