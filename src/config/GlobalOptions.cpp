@@ -5,3 +5,5 @@ GlobalOptions &GlobalOptions::global()
     static GlobalOptions options;
     return options;
 }
+
+int PingTimeoutMs = 500;

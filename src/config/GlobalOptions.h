@@ -19,3 +19,6 @@ struct GlobalOptions
     // The one instance the program uses.
     static GlobalOptions &global();
 };
+
+// Echo time-out in milliseconds used by the ping tools and the watchdog.
+extern int PingTimeoutMs;

@@ -1,7 +1,7 @@
 #include "SessionEngine.h"
 
 #include "ErrorLog.h"
-#include "OptionsTransfer.h"
+#include "config/OptionsTransfer.h"
 #include "config/GlobalOptions.h"
 #include "localisation/ResourceStrings.h"
 #include "platform/SerialPortControl.h"

@@ -3,7 +3,7 @@
 #include "SessionBuffer.h"
 #include "SessionPlatform.h"
 #include "SessionRecord.h"
-#include "SessionSettings.h"
+#include "config/SessionSettings.h"
 
 #include <QObject>
 #include <QStringList>

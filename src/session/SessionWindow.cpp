@@ -2,7 +2,8 @@
 #include "ui_SessionWindow.h"
 
 #include "NumberText.h"
-#include "OptionsTransfer.h"
+#include "config/GlobalOptions.h"
+#include "config/OptionsTransfer.h"
 #include "SessionEngine.h"
 #include "UserDialogs.h"
 #include "localisation/ApplyResourceStrings.h"

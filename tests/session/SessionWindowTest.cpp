@@ -1,4 +1,5 @@
-#include "session/OptionsTransfer.h"
+#include "config/GlobalOptions.h"
+#include "config/OptionsTransfer.h"
 #include "session/SessionEngine.h"
 #include "session/SessionWindow.h"
 #include "session/UserDialogs.h"

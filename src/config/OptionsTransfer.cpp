@@ -1,7 +1,5 @@
 #include "OptionsTransfer.h"
 
-int PingTimeoutMs = 500;
-
 OptionsTransfer &OptionsTransfer::global()
 {
     static OptionsTransfer transfer;

@@ -24,6 +24,3 @@ struct OptionsTransfer
 
     static OptionsTransfer &global();
 };
-
-// Echo time-out in milliseconds used by the ping tools and the watchdog.
-extern int PingTimeoutMs;
