@@ -5,6 +5,13 @@
 #include <QFile>
 #include <QRegularExpression>
 
+#include <arpa/inet.h>
+#include <fcntl.h>
+#include <netinet/in.h>
+#include <poll.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
 namespace {
 
 QStringList logLines(const QTemporaryDir &folder)
@@ -312,6 +319,76 @@ TEST_F(BridgeTest, ErrorLogRecordsEveryStatusChangeWithTheRole)
     EXPECT_TRUE(logLines(folder).last().endsWith(
         QStringLiteral(", Velloca IP Address: 127.0.0.1, Client Mode, Remote Host: 127.0.0.1, RemotePort: %1")
             .arg(server.serverPort())));
+}
+
+} // namespace
+
+namespace {
+
+// Writes to the pty master until the kernel refuses more for a while, i.e.
+// the session has stopped reading the serial side.
+qsizetype writeUntilHeldBack(PtyPair &pty, const QByteArray &data, qsizetype from)
+{
+    int refusals = 0;
+    while (from < data.size() && refusals < 100) {
+        const ssize_t n = ::write(pty.masterFd(), data.constData() + from, size_t(qMin<qsizetype>(4096, data.size() - from)));
+        if (n > 0) {
+            from += n;
+            refusals = 0;
+        } else {
+            ++refusals;
+            QTest::qWait(5);
+        }
+    }
+    return from;
+}
+
+TEST_F(BridgeTest, PeerThatDoesNotReadHoldsTheSerialSideBackWithoutLoss)
+{
+    activateServer();
+    // A plain socket with a small fixed receive window, so that neither the
+    // kernel nor a client library soaks up the stream while it is not read.
+    const int client = ::socket(AF_INET, SOCK_STREAM, 0);
+    const int window = 4096;
+    setsockopt(client, SOL_SOCKET, SO_RCVBUF, &window, sizeof window);
+    sockaddr_in address {};
+    address.sin_family = AF_INET;
+    address.sin_port = htons(quint16(serverPort()));
+    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+    ASSERT_EQ(::connect(client, reinterpret_cast<sockaddr *>(&address), sizeof address), 0);
+    fcntl(client, F_SETFL, O_NONBLOCK);
+    ASSERT_TRUE(waitUntil([&] { return engine->record().ClientCount == 1; }));
+
+    // More than the kernel's send buffer can take (tcp_wmem tops out at 4 MiB).
+    const QByteArray payload = randomBytes(8 << 20);
+    const qsizetype written = writeUntilHeldBack(pty, payload, 0);
+    ASSERT_LT(written, payload.size()) << "the serial side was never held back";
+    // What waits inside the program stays within the session's buffers.
+    const qint64 capacity = engine->myBuffer().capacity();
+    EXPECT_LE(engine->socket(1)->bytesToWrite(), 2 * capacity);
+    EXPECT_LE(engine->myBuffer().count(), capacity);
+
+    QByteArray received;
+    qsizetype sent = written;
+    char chunk[65536];
+    // The test's peer is a raw socket the event loop does not watch, so it
+    // is pumped by hand: read what came, feed the pty, let the program run.
+    QDeadlineTimer deadline(60000);
+    while (received.size() < payload.size() && !deadline.hasExpired()) {
+        for (ssize_t n; (n = ::read(client, chunk, sizeof chunk)) > 0;)
+            received.append(chunk, n);
+        if (sent < payload.size()) {
+            const ssize_t n = ::write(pty.masterFd(), payload.constData() + sent, size_t(qMin<qsizetype>(65536, payload.size() - sent)));
+            if (n > 0)
+                sent += n;
+        }
+        QCoreApplication::processEvents();
+        pollfd readable { client, POLLIN, 0 };
+        ::poll(&readable, 1, 1);
+    }
+    ASSERT_EQ(received.size(), payload.size());
+    EXPECT_TRUE(received == payload);
+    ::close(client);
 }
 
 } // namespace
