@@ -1,8 +1,9 @@
 #include "DisplayPlatform.h"
 
-#include "platform/VirtualPortFolder.h"
-#include "session/SessionEngine.h"
-#include "session/SessionWindow.h"
+#include "dialogs/ClientOptionsDialog.h"
+#include "dialogs/ServerOptionsDialog.h"
+#include "shell/MainWindow.h"
+#include "shell/UnixSignalWatcher.h"
 
 #include <QApplication>
 
@@ -12,9 +13,28 @@ int main(int argc, char **argv)
     QApplication app(argc, argv);
     QApplication::setApplicationName(QStringLiteral("Velloca"));
     QApplication::setApplicationVersion(QStringLiteral(VELLOCA_VERSION));
+    // Hidden in the tray is not the end: only an exit ends the program.
+    QApplication::setQuitOnLastWindowClosed(false);
 
-    SessionEngine engine(SessionPlatform::real(defaultVirtualPortFolder()));
-    SessionWindow window(&engine);
-    window.show();
-    return app.exec();
+    // The whole command line is one text: a file name with blanks may come
+    // as several arguments.
+    const QString commandLine = QApplication::arguments().mid(1).join(u' ');
+    MainWindow window(commandLine);
+    window.showIOOptionsDialog = [](QWidget *parent, bool server) {
+        if (server)
+            showServerOptionsDialog(parent);
+        else
+            showClientOptionsDialog(parent);
+    };
+
+    int earlyExitStatus = -1;
+    QObject::connect(&window, &MainWindow::finishedEarly, &app, [&](int status) {
+        earlyExitStatus = status;
+        QApplication::exit(status);
+    });
+    UnixSignalWatcher signalWatcher;
+    QObject::connect(&signalWatcher, &UnixSignalWatcher::terminationRequested, &window, &QWidget::close);
+
+    const int status = app.exec();
+    return earlyExitStatus >= 0 ? earlyExitStatus : status;
 }

@@ -2,6 +2,7 @@
 #include "ui_SessionWindow.h"
 
 #include "NumberText.h"
+#include "config/ConfigurationFile.h"
 #include "config/GlobalOptions.h"
 #include "config/OptionsTransfer.h"
 #include "SessionEngine.h"
@@ -285,4 +286,53 @@ bool SessionWindow::eventFilter(QObject *watched, QEvent *event)
     if (watched == m_ui->Frame2 && event->type() == QEvent::MouseButtonDblClick)
         Frame2_DblClick();
     return QWidget::eventFilter(watched, event);
+}
+
+void SessionWindow::applyConfiguration(const SessionConfig &config)
+{
+    const SessionSettings &s = config.settings;
+    auto select = [](QComboBox *box, int index) {
+        if (index >= 0 && index < box->count())
+            box->setCurrentIndex(index);
+    };
+    select(m_ui->Combo2, s.Connector);
+    m_engine->setCommandTopic(m_ui->Combo2->currentText());
+    select(m_ui->Combo1_0, s.BaudRate);
+    select(m_ui->Combo1_1, s.Parity);
+    select(m_ui->Combo1_2, s.Databits);
+    select(m_ui->Combo1_3, s.Stopbits);
+    select(m_ui->Combo1_4, s.FlowControl);
+    select(m_ui->Combo1_5, s.BufferSize);
+    m_ui->BufferSerData->setChecked(s.BufferSerialData == 1);
+    m_ui->chkVPort->setChecked(s.CreateVirtualPort == 1);
+    m_ui->chkUDP->setChecked(s.UseUDP == 1);
+    m_ui->LocalIP->setEditText(s.LocalIP);
+    m_ui->IPAddress->setText(s.IPAddress);
+    m_ui->PortNumber->setText(s.PortNumber);
+    if (s.TCPOption == 0)
+        m_ui->TCPOption_0->setChecked(true);
+    else
+        m_ui->TCPOption_1->setChecked(true);
+    TCPOption_Click(s.TCPOption == 0 ? 0 : 1);
+
+    OptionsTransfer::global() = config.options;
+    m_engine->UpdateStatus();
+
+    m_ui->WaitForCr->setChecked(s.WaitForCr == 1);
+    m_ui->txtTimeoutValue->setText(s.TimeoutValue);
+    if (!s.SessionDescription.isEmpty()) {
+        m_engine->settings().SessionDescription = s.SessionDescription;
+        m_engine->setCaption(s.SessionDescription);
+    }
+}
+
+SessionConfig SessionWindow::currentConfiguration() const
+{
+    SessionConfig config;
+    config.settings = m_engine->settings();
+    config.settings.TCPOption = m_ui->TCPOption_1->isChecked() ? 1 : 0;
+    m_engine->Getstatus();
+    config.options = OptionsTransfer::global();
+    config.AutoActivate = m_engine->isActive() ? 1 : 0;
+    return config;
 }

@@ -7,6 +7,7 @@
 
 class QComboBox;
 class SessionEngine;
+struct SessionConfig;
 namespace Ui { class SessionWindow; }
 
 // The window of one session: shows and edits the engine's settings, shows
@@ -20,6 +21,12 @@ public:
     ~SessionWindow() override;
 
     SessionEngine *engine() const { return m_engine; }
+
+    // Puts a session's saved settings into the controls, exactly as a user's
+    // choices would; a list index the list does not have is left alone.
+    void applyConfiguration(const SessionConfig &config);
+    // The settings to save, with AutoActivate set while the session runs.
+    SessionConfig currentConfiguration() const;
 
     // The option dialogs are shown through these hooks; until a dialog is
     // installed the values just pass through the options transfer variables.

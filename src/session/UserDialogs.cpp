@@ -1,5 +1,6 @@
 #include "UserDialogs.h"
 
+#include <QFileDialog>
 #include <QInputDialog>
 #include <QMessageBox>
 
@@ -15,6 +16,12 @@ MessageHandler &messageHandler()
 InputHandler &inputHandler()
 {
     static InputHandler handler;
+    return handler;
+}
+
+FileHandler &fileHandler()
+{
+    static FileHandler handler;
     return handler;
 }
 
@@ -50,6 +57,25 @@ std::optional<QString> askText(const InputRequest &request)
     if (!ok)
         return std::nullopt;
     return answer;
+}
+
+std::optional<QString> askFileName(const FileRequest &request)
+{
+    if (fileHandler())
+        return fileHandler()(request);
+    QFileDialog dialog(request.parent, request.title, QString(), request.filter);
+    dialog.setAcceptMode(request.save ? QFileDialog::AcceptSave : QFileDialog::AcceptOpen);
+    dialog.setFileMode(request.save ? QFileDialog::AnyFile : QFileDialog::ExistingFile);
+    dialog.setOption(QFileDialog::DontConfirmOverwrite, request.save);
+    dialog.setDefaultSuffix(request.defaultSuffix);
+    if (dialog.exec() != QDialog::Accepted || dialog.selectedFiles().isEmpty())
+        return std::nullopt;
+    return dialog.selectedFiles().constFirst();
+}
+
+void setFileHandler(FileHandler handler)
+{
+    fileHandler() = std::move(handler);
 }
 
 void setMessageHandler(MessageHandler handler)

@@ -1,0 +1,102 @@
+#pragma once
+
+#include "config/ConfigurationFile.h"
+
+#include <QList>
+#include <QMainWindow>
+#include <QPointer>
+#include <QTimer>
+
+#include <functional>
+#include <memory>
+#include <optional>
+
+class QLockFile;
+class QMdiSubWindow;
+class QMenu;
+class QSystemTrayIcon;
+class SessionWindow;
+namespace Ui { class MainWindow; }
+
+// The program's frame: holds the session windows, runs the start-up
+// sequence once, loads and saves configurations, hides in the tray and
+// saves everything to the default file when it ends.
+class MainWindow : public QMainWindow
+{
+    Q_OBJECT
+public:
+    // commandLine: the program's arguments joined by blanks, as one text.
+    explicit MainWindow(QString commandLine, QWidget *parent = nullptr);
+    ~MainWindow() override;
+
+    // Load / save a configuration; an empty name means the default file.
+    void getprofilesettings(const QString &fileName);
+    void writeprofilesettings(const QString &fileName);
+    SessionWindow *NewSessionWindow();
+    // Session windows in creation order (session 1, 2, ...).
+    QList<SessionWindow *> sessionWindows() const;
+
+    // Ends the program about half a second from now, so that the command
+    // that asked for it can still be answered.
+    void requestExit();
+    bool startUpDone() const { return m_startUpDone; }
+    QString currentConfigFile() const { return m_currentConfigFile; }
+    bool trayIconAdded() const { return m_trayIcon != nullptr; }
+
+    // Asks for the password before the window is shown again; replaced by
+    // tests. Returns the entry, or nothing when the user cancelled.
+    std::function<std::optional<QString>()> askPassword;
+    // Shows the session options dialog of the given role; set by the program.
+    std::function<void(QWidget *parent, bool server)> showIOOptionsDialog;
+
+    // Menu commands, public so tests and other windows can run them.
+    void mnuFileNew_Click();
+    void mnuFileOpen_Click();
+    void mnuFileClose_Click();
+    void mnuFileSave_Click();
+    void mnuFileSaveAs_Click();
+    void mnuFileExit_Click();
+    void mnuOpen_Click();
+    void mnuExit_Click();
+    void runStartUpNow();
+
+Q_SIGNALS:
+    // A service switch was handled: the program ends with this status.
+    void finishedEarly(int exitStatus);
+
+protected:
+    void changeEvent(QEvent *event) override;
+    void closeEvent(QCloseEvent *event) override;
+
+private:
+    void Timer1_Tick();
+    void StartUpSequence();
+    bool handleServiceSwitch(const QString &commandLine);
+    void addTrayIcon();
+    void resetBusInFirstCopy();
+    void autoActivate();
+    void handleWindowStateChange();
+    void restoreCheck();
+    void shutdown();
+    void closeAllSessionWindows();
+    void rebuildWindowMenu();
+    void wireMenus();
+    void showTrayPopup();
+    QString virtualPortFolder() const;
+
+    std::unique_ptr<Ui::MainWindow> m_ui;
+    QString m_commandLine;
+    QTimer m_timer1;
+    QList<QPointer<SessionWindow>> m_sessions;
+    QList<int> m_autoActivateList;
+    QString m_currentConfigFile;
+    QString m_virtualPortFolder;
+    QSystemTrayIcon *m_trayIcon = nullptr;
+    QMenu *m_trayMenu = nullptr;
+    std::unique_ptr<QLockFile> m_instanceLock;
+    bool m_startUpDone = false;
+    bool m_exitRequested = false;
+    bool m_resizeBusy = false;
+    bool m_mainWindowLocked = false;
+    bool m_shutDown = false;
+};
