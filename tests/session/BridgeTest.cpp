@@ -392,3 +392,45 @@ TEST_F(BridgeTest, PeerThatDoesNotReadHoldsTheSerialSideBackWithoutLoss)
 }
 
 } // namespace
+
+namespace {
+
+TEST_F(BridgeTest, VirtualPortClientConnectsOnlyWhileAnApplicationHoldsThePort)
+{
+    QTcpServer server;
+    ASSERT_TRUE(server.listen(QHostAddress::LocalHost, 0));
+    engine->settings().CreateVirtualPort = 1;
+    engine->settings().Connector = 5;
+    engine->settings().PortNumber = QString::number(server.serverPort());
+    engine->Command1_Click();
+    ASSERT_TRUE(engine->isActive());
+    EXPECT_FALSE(waitUntil([&] { return server.hasPendingConnections(); }, 300));
+
+    const QByteArray link = folder.filePath(QStringLiteral("ports/COM5")).toLocal8Bit();
+    const int application = ::open(link.constData(), O_RDWR | O_NOCTTY | O_NONBLOCK);
+    ASSERT_GE(application, 0);
+    ASSERT_TRUE(waitUntil([&] { return server.hasPendingConnections(); }));
+    std::unique_ptr<QTcpSocket> peer(server.nextPendingConnection());
+    ASSERT_TRUE(waitUntil([&] {
+        return engine->statusLine(SessionEngine::NetworkLine) == QStringLiteral("TCP/IP Status: Connected");
+    }));
+
+    ASSERT_EQ(::write(application, "from the app", 12), 12);
+    EXPECT_EQ(readSocket(*peer, 12), QByteArray("from the app"));
+    peer->write("to the app");
+    QByteArray atApplication;
+    ASSERT_TRUE(waitUntil([&] {
+        char buffer[64];
+        const ssize_t n = ::read(application, buffer, sizeof buffer);
+        if (n > 0)
+            atApplication.append(buffer, n);
+        return atApplication == "to the app";
+    }));
+
+    ::close(application);
+    ASSERT_TRUE(waitUntil([&] { return peer->state() == QAbstractSocket::UnconnectedState; }));
+    EXPECT_EQ(engine->statusLine(SessionEngine::NetworkLine), QStringLiteral("TCP/IP Status: Closed"));
+    EXPECT_FALSE(engine->isReconnecting()) << "a closed port is no reason to reconnect";
+}
+
+} // namespace
