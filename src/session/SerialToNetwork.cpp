@@ -9,6 +9,8 @@
 #include "platform/SocketMember.h"
 #include "platform/VirtualPortControl.h"
 
+#include <QScopedValueRollback>
+
 namespace {
 
 constexpr int kDefaultPacketSize = 2000;
@@ -84,72 +86,65 @@ void SessionEngine::sendHeldData(bool packetMode, bool mayHold)
     }
 }
 
+bool SessionEngine::serialInputIgnored() const
+{
+    return (isServer() && m_record.ServerSerialOptions == 1) || (!isServer() && m_record.ClientOptions == 2);
+}
+
+void SessionEngine::moveSerialInput(const std::function<qint64()> &pending,
+                                    const std::function<QByteArray(qint32)> &read, bool mayHold)
+{
+    const bool packetMode = m_settings.WaitForCr != 0;
+    // Read only what the hold buffer can take; the rest stays in the port
+    // until sending makes room (nothing is read just to be dropped).
+    while (pending() > 0) {
+        const qint32 room = serialReadRoom();
+        if (room <= 0)
+            break;
+        Add2MyBuffer(read(room));
+        sendHeldData(packetMode, mayHold);
+    }
+    if (packetMode && pending() == 0)
+        m_record.FlushTicks = 0;
+}
+
 void SessionEngine::SerialReceive()
 {
     if (m_inSerialReceive)
         return;
-    m_inSerialReceive = true;
+    const QScopedValueRollback<bool> receiving(m_inSerialReceive, true);
     setLamp(0, true);
-    const bool serialIgnored = (isServer() && m_record.ServerSerialOptions == 1)
-        || (!isServer() && m_record.ClientOptions == 2);
-    if (serialIgnored) {
+    if (serialInputIgnored()) {
         m_serialPort->discardInput();
-        m_inSerialReceive = false;
         return;
     }
     const bool connected = anyConnected();
-    if (m_serialPort->commEvent() != SerialPortControl::kCommEventReceive) {
-        m_inSerialReceive = false;
+    if (m_serialPort->commEvent() != SerialPortControl::kCommEventReceive)
         return;
-    }
     const bool mayHold = m_settings.BufferSerialData != 0;
     if (!m_record.UseUDP && !mayHold && !connected) {
         m_serialPort->discardInput();
-        m_inSerialReceive = false;
         return;
     }
-    const bool packetMode = m_settings.WaitForCr != 0;
-    // Read only what the hold buffer can take; the rest stays in the port
-    // until sending makes room (nothing is read just to be dropped).
-    while (m_serialPort->inBufferCount() > 0) {
-        const qint32 room = serialReadRoom();
-        if (room <= 0)
-            break;
-        Add2MyBuffer(m_serialPort->input(room));
-        sendHeldData(packetMode, mayHold);
-    }
-    if (packetMode && m_serialPort->inBufferCount() == 0)
-        m_record.FlushTicks = 0;
-    m_inSerialReceive = false;
+    moveSerialInput([this] { return m_serialPort->inBufferCount(); },
+                    [this](qint32 room) { return m_serialPort->input(room); }, mayHold);
 }
 
 void SessionEngine::VirtualReceive()
 {
     if (m_inSerialReceive)
         return;
-    m_inSerialReceive = true;
+    const QScopedValueRollback<bool> receiving(m_inSerialReceive, true);
     setLamp(0, true);
-    const bool serialIgnored = (isServer() && m_record.ServerSerialOptions == 1)
-        || (!isServer() && m_record.ClientOptions == 2);
-    if (serialIgnored) {
+    if (serialInputIgnored()) {
         m_virtualPort->discardInput();
-        m_inSerialReceive = false;
         return;
     }
-    const bool packetMode = m_settings.WaitForCr != 0;
     // Data from the virtual port is always read; with nobody connected and
     // nothing to hold for, SendToClients finds no one and it is dropped.
     const bool mayHold = !m_record.UseUDP && m_settings.BufferSerialData != 0;
-    while (m_virtualPort->available() > 0) {
-        const qint32 room = serialReadRoom();
-        if (room <= 0)
-            break;
-        Add2MyBuffer(m_virtualPort->read(room));
-        sendHeldData(packetMode, mayHold);
-    }
-    if (packetMode)
-        m_record.FlushTicks = 0;
-    m_inSerialReceive = false;
+    moveSerialInput([this] { return m_virtualPort->available(); },
+                    [this](qint32 room) { return m_virtualPort->read(room); }, mayHold);
 }
 
 void SessionEngine::resumeSerialReading()

@@ -138,32 +138,33 @@ void SessionEngine::setSettingsLocked(bool locked)
     Q_EMIT settingsLockChanged(locked);
 }
 
+namespace {
+
+// The session record and the transfer values name the nine options alike.
+template <typename From, typename To>
+void copySessionOptions(const From &from, To &to)
+{
+    to.AllowMultiConnect = from.AllowMultiConnect;
+    to.ServerSerialOptions = from.ServerSerialOptions;
+    to.ServerTCPOptions = from.ServerTCPOptions;
+    to.ClientOptions = from.ClientOptions;
+    to.ConnectOnVirtualOpen = from.ConnectOnVirtualOpen;
+    to.UserPrompt = from.UserPrompt;
+    to.UserPromptResponse = from.UserPromptResponse;
+    to.PasswordPrompt = from.PasswordPrompt;
+    to.PasswordPromptResponse = from.PasswordPromptResponse;
+}
+
+} // namespace
+
 void SessionEngine::Getstatus() const
 {
-    OptionsTransfer &t = OptionsTransfer::global();
-    t.AllowMultiConnect = m_record.AllowMultiConnect;
-    t.ServerSerialOptions = m_record.ServerSerialOptions;
-    t.ServerTCPOptions = m_record.ServerTCPOptions;
-    t.ClientOptions = m_record.ClientOptions;
-    t.ConnectOnVirtualOpen = m_record.ConnectOnVirtualOpen;
-    t.UserPrompt = m_record.UserPrompt;
-    t.UserPromptResponse = m_record.UserPromptResponse;
-    t.PasswordPrompt = m_record.PasswordPrompt;
-    t.PasswordPromptResponse = m_record.PasswordPromptResponse;
+    copySessionOptions(m_record, OptionsTransfer::global());
 }
 
 void SessionEngine::UpdateStatus()
 {
-    const OptionsTransfer &t = OptionsTransfer::global();
-    m_record.AllowMultiConnect = t.AllowMultiConnect;
-    m_record.ServerSerialOptions = t.ServerSerialOptions;
-    m_record.ServerTCPOptions = t.ServerTCPOptions;
-    m_record.ClientOptions = t.ClientOptions;
-    m_record.ConnectOnVirtualOpen = t.ConnectOnVirtualOpen;
-    m_record.UserPrompt = t.UserPrompt;
-    m_record.UserPromptResponse = t.UserPromptResponse;
-    m_record.PasswordPrompt = t.PasswordPrompt;
-    m_record.PasswordPromptResponse = t.PasswordPromptResponse;
+    copySessionOptions(OptionsTransfer::global(), m_record);
 }
 
 QStringList SessionEngine::connectedClientAddresses() const

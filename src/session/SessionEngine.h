@@ -9,6 +9,7 @@
 #include <QStringList>
 #include <QTimer>
 
+#include <functional>
 #include <vector>
 
 class SerialPortControl;
@@ -120,6 +121,9 @@ private:
     void VirtualReceive();
     void VirtualOpenClose(bool opened);
     qint32 serialReadRoom() const;
+    bool serialInputIgnored() const;
+    void moveSerialInput(const std::function<qint64()> &pending,
+                         const std::function<QByteArray(qint32)> &read, bool mayHold);
     void sendHeldData(bool packetMode, bool mayHold);
     void flushOnTimeout();
     void resumeSerialReading();
