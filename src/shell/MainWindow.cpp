@@ -2,6 +2,7 @@
 #include "ui_MainWindow.h"
 
 #include "AppIcon.h"
+#include "MdiArrangement.h"
 #include "config/GlobalOptions.h"
 #include "config/IniProfile.h"
 #include "config/ProgramFolder.h"
@@ -75,9 +76,16 @@ void MainWindow::wireMenus()
     m_ui->mnuFileClose->setEnabled(false);
 
     connect(m_ui->mnuWindowCascade, &QAction::triggered, m_ui->mdiArea, &QMdiArea::cascadeSubWindows);
-    connect(m_ui->mnuWindowTileHorizontal, &QAction::triggered, m_ui->mdiArea, &QMdiArea::tileSubWindows);
-    connect(m_ui->mnuWindowTileVertical, &QAction::triggered, m_ui->mdiArea, &QMdiArea::tileSubWindows);
-    connect(m_ui->mnuWindowArrangeIcons, &QAction::triggered, m_ui->mdiArea, &QMdiArea::tileSubWindows);
+    connect(m_ui->mnuWindowTileHorizontal, &QAction::triggered, this,
+            [this] { MdiArrangement::tileHorizontally(m_ui->mdiArea); });
+    connect(m_ui->mnuWindowTileVertical, &QAction::triggered, this,
+            [this] { MdiArrangement::tileVertically(m_ui->mdiArea); });
+    connect(m_ui->mnuWindowArrangeIcons, &QAction::triggered, this,
+            [this] { MdiArrangement::arrangeIcons(m_ui->mdiArea); });
+    // Their windows do not exist yet; the items stay visible but inactive.
+    for (QAction *pending : { m_ui->mnuOptions_0, m_ui->mPassword, m_ui->mPingTool, m_ui->mResolve,
+                              m_ui->mnuHelpContents, m_ui->mnuOrvane, m_ui->mnuHelpAbout, m_ui->mnuAbout })
+        pending->setEnabled(false);
     connect(m_ui->mnuWindow, &QMenu::aboutToShow, this, &MainWindow::rebuildWindowMenu);
 
     connect(m_ui->mnuOpen, &QAction::triggered, this, &MainWindow::mnuOpen_Click);
