@@ -176,14 +176,7 @@ bool SessionEngine::openPhysicalPort()
 {
     m_serialPort->close();
     m_serialPort->setPortNumber(m_record.ComPortNumber);
-    const QString settingsText = QStringLiteral("%1,%2,%3,%4")
-        .arg(listEntry(SessionLists::kBaudRates, m_settings.BaudRate))
-        .arg(m_settings.Parity >= 0 && m_settings.Parity < int(SessionLists::kParityLetters.size())
-                 ? QChar::fromLatin1(SessionLists::kParityLetters[size_t(m_settings.Parity)])
-                 : QChar())
-        .arg(listEntry(SessionLists::kDataBits, m_settings.Databits))
-        .arg(listEntry(SessionLists::kStopBits, m_settings.Stopbits));
-    if (!m_serialPort->setSettings(settingsText)) {
+    if (!m_serialPort->setSettings(serialSettingsText())) {
         failSerialOpen(m_serialPort->errorString());
         return false;
     }
@@ -210,6 +203,17 @@ bool SessionEngine::openPhysicalPort()
     }
     setStatusLine(ComLine, composeStatus(kComCaption, 5096));
     return true;
+}
+
+QString SessionEngine::serialSettingsText() const
+{
+    const int parity = m_settings.Parity;
+    const bool parityKnown = parity >= 0 && parity < int(SessionLists::kParityLetters.size());
+    return QStringLiteral("%1,%2,%3,%4")
+        .arg(listEntry(SessionLists::kBaudRates, m_settings.BaudRate))
+        .arg(parityKnown ? QChar::fromLatin1(SessionLists::kParityLetters[size_t(parity)]) : QChar())
+        .arg(listEntry(SessionLists::kDataBits, m_settings.Databits))
+        .arg(listEntry(SessionLists::kStopBits, m_settings.Stopbits));
 }
 
 bool SessionEngine::sizeBuffers()

@@ -71,6 +71,10 @@ public:
 
     // Activate / De-Activate: a toggle decided by the button's caption.
     void Command1_Click();
+    // Runs a command from another program; true when it was accepted.
+    bool executeCommand(const QString &command);
+    // "baud,parity,data,stop" from the selected list entries, e.g. 9600,N,8,1.
+    QString serialSettingsText() const;
 
     // The two data buffers (hold buffer: serial to network; serial output
     // buffer: network to serial). Adds take what fits and return how much.
@@ -104,12 +108,15 @@ Q_SIGNALS:
     void activateCaptionChanged(const QString &caption);
     void settingsLockChanged(bool locked);
     void lampChanged(int lamp, bool lit);
+    // A command changed the serial list settings; the window shows them anew.
+    void serialSettingsChanged();
 
 private:
     // Activation and deactivation.
     void activate();
     void deactivate();
     bool openPhysicalPort();
+    bool applyComSettings(QString fields);
     void failSerialOpen(const QString &description);
     void failSocketStart(const QString &description);
     void closeSerialSide();

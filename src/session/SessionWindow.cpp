@@ -164,6 +164,14 @@ void SessionWindow::bindEngine()
     connect(m_engine, &SessionEngine::lampChanged, this, showLamp);
     connect(m_ui->Command1, &QPushButton::clicked, m_engine, &SessionEngine::Command1_Click);
 
+    connect(m_engine, &SessionEngine::serialSettingsChanged, this, [this] {
+        const SessionSettings &s = m_engine->settings();
+        m_ui->Combo1_0->setCurrentIndex(s.BaudRate);
+        m_ui->Combo1_1->setCurrentIndex(s.Parity);
+        m_ui->Combo1_2->setCurrentIndex(s.Databits);
+        m_ui->Combo1_3->setCurrentIndex(s.Stopbits);
+    });
+
     applyLock(m_engine->settingsLocked());
     connect(m_engine, &SessionEngine::settingsLockChanged, this, &SessionWindow::applyLock);
 }

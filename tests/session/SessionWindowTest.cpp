@@ -205,6 +205,13 @@ TEST_F(SessionWindowTest, StatusLinesAndLockFollowTheEngine)
         EXPECT_TRUE(child<QWidget>(free)->isEnabled()) << free;
     engine.setSettingsLocked(false);
     EXPECT_TRUE(child<QWidget>("Combo1_0")->isEnabled());
+
+    // Serial settings changed by a command show in the lists.
+    ASSERT_TRUE(engine.executeCommand(QStringLiteral("[COMSETTINGS=19200,E,7,2]")));
+    EXPECT_EQ(child<QComboBox>("Combo1_0")->currentText(), QStringLiteral("19200"));
+    EXPECT_EQ(child<QComboBox>("Combo1_1")->currentText(), QStringLiteral("Even"));
+    EXPECT_EQ(child<QComboBox>("Combo1_2")->currentText(), QStringLiteral("7"));
+    EXPECT_EQ(child<QComboBox>("Combo1_3")->currentText(), QStringLiteral("2"));
 }
 
 TEST_F(SessionWindowTest, IOOptionsPassThroughTheTransferVariablesUnlessCancelled)
