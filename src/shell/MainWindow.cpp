@@ -20,6 +20,7 @@
 #include <QDir>
 #include <QLockFile>
 #include <QMdiSubWindow>
+#include <QRegularExpression>
 #include <QSystemTrayIcon>
 #include <QTextStream>
 
@@ -140,6 +141,35 @@ void MainWindow::requestExit()
     m_timer1.stop();
     m_timer1.setInterval(kExitDelayMs);
     m_timer1.start();
+}
+
+bool MainWindow::executeCommand(const QString &topic, const QString &command)
+{
+    if (topic.compare(QStringLiteral("System"), Qt::CaseInsensitive) == 0) {
+        if (command.toUpper().trimmed() != QStringLiteral("[APPEXIT]"))
+            return false;
+        requestExit();
+        return true;
+    }
+    SessionWindow *session = sessionForTopic(topic);
+    return session && session->engine()->executeCommand(command);
+}
+
+SessionWindow *MainWindow::sessionForTopic(const QString &topic) const
+{
+    const QList<SessionWindow *> windows = sessionWindows();
+    static const QRegularExpression numbered(QStringLiteral("^Session([0-9]{1,9})$"),
+                                             QRegularExpression::CaseInsensitiveOption);
+    if (const auto match = numbered.match(topic); match.hasMatch()) {
+        const int n = match.captured(1).toInt();
+        return n >= 1 && n <= windows.size() ? windows[n - 1] : nullptr;
+    }
+    // Several sessions may share a connector name; the first one answers.
+    for (SessionWindow *window : windows) {
+        if (window->engine()->commandTopic().compare(topic, Qt::CaseInsensitive) == 0)
+            return window;
+    }
+    return nullptr;
 }
 
 void MainWindow::StartUpSequence()

@@ -39,6 +39,10 @@ public:
     // Ends the program about half a second from now, so that the command
     // that asked for it can still be answered.
     void requestExit();
+    // A command from another program for a topic: "System" (this window),
+    // "Session<n>" (session n) or a connector such as "COM3". True when
+    // accepted.
+    bool executeCommand(const QString &topic, const QString &command);
     bool startUpDone() const { return m_startUpDone; }
     QString currentConfigFile() const { return m_currentConfigFile; }
     bool trayIconAdded() const { return m_trayIcon != nullptr; }
@@ -83,6 +87,7 @@ private:
     void wireMenus();
     void showTrayPopup();
     QString virtualPortFolder() const;
+    SessionWindow *sessionForTopic(const QString &topic) const;
 
     std::unique_ptr<Ui::MainWindow> m_ui;
     QString m_commandLine;

@@ -181,6 +181,30 @@ TEST_F(MainWindowTest, RestoringAsksForThePasswordOnlyWhenOneIsSet)
     EXPECT_FALSE(window.isMinimized());
 }
 
+TEST_F(MainWindowTest, CommandsReachTheSessionNamedByTheirTopic)
+{
+    writeFile(QStringLiteral("default.vlk"),
+              "[Velloca]\nNumSessions=2\n[Session1]\nConnector=3\n[Session2]\nConnector=4\n");
+    MainWindow window { QString() };
+    window.runStartUpNow();
+    const QList<SessionWindow *> sessions = window.sessionWindows();
+    ASSERT_EQ(sessions.size(), 2);
+    EXPECT_TRUE(window.executeCommand(QStringLiteral("COM4"), QStringLiteral("[COMSETTINGS=300,N,8,1]")));
+    EXPECT_EQ(sessions[1]->engine()->settings().BaudRate, 1);
+    EXPECT_TRUE(window.executeCommand(QStringLiteral("session1"), QStringLiteral("[COMSETTINGS=600,N,8,1]")));
+    EXPECT_EQ(sessions[0]->engine()->settings().BaudRate, 2);
+    EXPECT_FALSE(window.executeCommand(QStringLiteral("Session3"), QStringLiteral("[COMSETTINGS=600,N,8,1]")));
+    EXPECT_FALSE(window.executeCommand(QStringLiteral("COM9"), QStringLiteral("[ACTIVATE]")));
+    EXPECT_FALSE(window.executeCommand(QStringLiteral("COM3"), QStringLiteral("[APPEXIT]")));
+    EXPECT_FALSE(window.executeCommand(QStringLiteral("System"), QStringLiteral("[ACTIVATE]")));
+
+    // The exit comes on a later tick, after the answer.
+    EXPECT_TRUE(window.executeCommand(QStringLiteral("System"), QStringLiteral(" [appexit] ")));
+    EXPECT_FALSE(window.sessionWindows().isEmpty());
+    ASSERT_TRUE(waitUntil([&] { return window.sessionWindows().isEmpty(); }, 5000));
+    EXPECT_TRUE(readFile(QStringLiteral("default.vlk")).contains("BaudRate=2"));
+}
+
 TEST_F(MainWindowTest, ServiceSwitchesEndTheProgramBeforeAnythingIsLoaded)
 {
     for (const char *commandLine : { " -i ", "/U", "-IH" }) {
