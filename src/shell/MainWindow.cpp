@@ -8,6 +8,7 @@
 #include "config/ProgramFolder.h"
 #include "localisation/ApplyResourceStrings.h"
 #include "localisation/ResourceStrings.h"
+#include "platform/CommandChannel.h"
 #include "platform/PortMap.h"
 #include "platform/VirtualPortFolder.h"
 #include "session/SessionEngine.h"
@@ -187,9 +188,19 @@ void MainWindow::StartUpSequence()
     }
     addTrayIcon();
     getprofilesettings(configFile);
+    openCommandChannel();
     resetBusInFirstCopy();
     autoActivate();
     m_startUpDone = true;
+}
+
+void MainWindow::openCommandChannel()
+{
+    m_commandChannel = new CommandChannel(
+        [this](const QString &topic, const QString &command) { return executeCommand(topic, command); }, this);
+    QString error;
+    if (!m_commandChannel->listen(defaultVirtualPortFolder(), &error))
+        qWarning("velloca: no command channel: %s", qPrintable(error));
 }
 
 bool MainWindow::handleServiceSwitch(const QString &commandLine)

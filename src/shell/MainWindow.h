@@ -11,6 +11,7 @@
 #include <memory>
 #include <optional>
 
+class CommandChannel;
 class QLockFile;
 class QMdiSubWindow;
 class QMenu;
@@ -77,6 +78,7 @@ private:
     void StartUpSequence();
     bool handleServiceSwitch(const QString &commandLine);
     void addTrayIcon();
+    void openCommandChannel();
     void resetBusInFirstCopy();
     void autoActivate();
     void handleWindowStateChange();
@@ -98,6 +100,7 @@ private:
     QString m_virtualPortFolder;
     QSystemTrayIcon *m_trayIcon = nullptr;
     QMenu *m_trayMenu = nullptr;
+    CommandChannel *m_commandChannel = nullptr;
     std::unique_ptr<QLockFile> m_instanceLock;
     bool m_startUpDone = false;
     bool m_exitRequested = false;
