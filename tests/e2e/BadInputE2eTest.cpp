@@ -1,0 +1,81 @@
+// Whatever the command line and the configuration file hold, the program
+// starts, keeps running and ends cleanly.
+#include "E2eSupport.h"
+#include "VellocaProcess.h"
+
+#include <QFile>
+#include <QFileInfo>
+#include <QRandomGenerator>
+
+#include <gtest/gtest.h>
+
+using namespace e2e;
+
+namespace {
+
+QString readText(const QString &path)
+{
+    QFile file(path);
+    return file.open(QIODevice::ReadOnly) ? QString::fromUtf8(file.readAll()) : QString();
+}
+
+} // namespace
+
+TEST(BadInputE2e, MissingFileNamedOnTheCommandLineStartsWithOneSession)
+{
+    VellocaProcess velloca;
+    ASSERT_TRUE(velloca.isValid());
+    const QString missing = velloca.rootPath() + QStringLiteral("/my configs/plant floor.vlk");
+    // A default file that must not be the one loaded: it has three sessions.
+    const QByteArray defaultConfiguration = "[Velloca]\r\nNumSessions=3\r\n";
+    // Unquoted in a shell, the name arrives as three arguments.
+    ASSERT_TRUE(velloca.start(defaultConfiguration, missing.split(u' ')))
+        << velloca.standardError().constData();
+    ASSERT_TRUE(velloca.waitForStartUp()) << velloca.standardError().constData();
+
+    ASSERT_TRUE(velloca.terminate(2000));
+    EXPECT_EQ(velloca.exitCode(), 0) << velloca.standardError().constData();
+    EXPECT_EQ(iniValue(readText(velloca.defaultConfigPath()), "Velloca", "NumSessions"), "1");
+    // The save goes to the default file only.
+    EXPECT_FALSE(QFileInfo::exists(missing));
+}
+
+TEST(BadInputE2e, GarbageDefaultFileIsSurvivedAndItsLinesKept)
+{
+    QByteArray garbage(64 * 1024, Qt::Uninitialized);
+    QRandomGenerator random(20240607);
+    for (char &byte : garbage)
+        byte = char(random.bounded(256));
+    const QByteArray longLine = "LongLine=" + QByteArray(1024 * 1024, 'x');
+    const QByteArray configuration = garbage + "\n" + longLine + "\n" + garbage;
+
+    VellocaProcess velloca;
+    ASSERT_TRUE(velloca.start(configuration)) << velloca.standardError().constData();
+    ASSERT_TRUE(velloca.waitForStartUp()) << velloca.standardError().constData();
+    EXPECT_TRUE(velloca.isRunning());
+
+    ASSERT_TRUE(velloca.terminate(2000)) << "still running 2 s after SIGTERM";
+    EXPECT_EQ(velloca.exitStatus(), QProcess::NormalExit);
+    EXPECT_EQ(velloca.exitCode(), 0) << velloca.standardError().constData();
+    const QString saved = readText(velloca.defaultConfigPath());
+    EXPECT_EQ(iniValue(saved, "Velloca", "NumSessions"), "1");
+    // Compared line by line: a substring search for a 1 MB needle is slow.
+    const QStringList savedLines = saved.split(QStringLiteral("\r\n"));
+    EXPECT_TRUE(savedLines.contains(QString::fromLatin1(longLine))) << "the 1 MB line was not kept";
+}
+
+TEST(BadInputE2e, ServiceSwitchesEndTheProgramWithAMessageAndTouchNothing)
+{
+    for (const QString &word : { QStringLiteral("-I"), QStringLiteral(" -u ") }) {
+        SCOPED_TRACE(qPrintable(word));
+        VellocaProcess velloca;
+        ASSERT_TRUE(velloca.start(QByteArray(), { word }));
+        ASSERT_TRUE(velloca.waitForExit(10000));
+        EXPECT_EQ(velloca.exitStatus(), QProcess::NormalExit);
+        EXPECT_EQ(velloca.exitCode(), 1);
+        const QByteArray message = velloca.standardError();
+        EXPECT_TRUE(message.contains(word.trimmed().toUpper().toUtf8())) << message.constData();
+        EXPECT_FALSE(QFileInfo::exists(velloca.defaultConfigPath()));
+        EXPECT_FALSE(QFileInfo::exists(velloca.errorLogPath()));
+    }
+}
