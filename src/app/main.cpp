@@ -1,7 +1,5 @@
 #include "DisplayPlatform.h"
 
-#include "dialogs/ClientOptionsDialog.h"
-#include "dialogs/ServerOptionsDialog.h"
 #include "shell/MainWindow.h"
 #include "shell/UnixSignalWatcher.h"
 
@@ -20,12 +18,6 @@ int main(int argc, char **argv)
     // as several arguments.
     const QString commandLine = QApplication::arguments().mid(1).join(u' ');
     MainWindow window(commandLine);
-    window.showIOOptionsDialog = [](QWidget *parent, bool server) {
-        if (server)
-            showServerOptionsDialog(parent);
-        else
-            showClientOptionsDialog(parent);
-    };
 
     int earlyExitStatus = -1;
     QObject::connect(&window, &MainWindow::finishedEarly, &app, [&](int status) {

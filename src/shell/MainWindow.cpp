@@ -8,7 +8,19 @@
 #include "config/ProgramFolder.h"
 #include "localisation/ApplyResourceStrings.h"
 #include "localisation/ResourceStrings.h"
+#include "dialogs/AboutDialog.h"
+#include "dialogs/ClientOptionsDialog.h"
+#include "dialogs/GlobalOptionsDialog.h"
+#include "dialogs/LoginOptionsDialog.h"
+#include "dialogs/PasswordDialogs.h"
+#include "dialogs/ServerOptionsDialog.h"
+#include "nettools/PingDialog.h"
+#include "nettools/ResolveDialog.h"
+#include "platform/AutostartEntry.h"
 #include "platform/CommandChannel.h"
+#include "platform/ServiceNotifier.h"
+#include "platform/ServiceSwitch.h"
+#include "platform/ServiceUnit.h"
 #include "platform/PortMap.h"
 #include "platform/VirtualPortFolder.h"
 #include "session/SessionEngine.h"
@@ -18,7 +30,11 @@
 #include <QApplication>
 #include <QCloseEvent>
 #include <QCursor>
+#include <QDesktopServices>
 #include <QDir>
+#include <QFileInfo>
+#include <QGuiApplication>
+#include <QUrl>
 #include <QLockFile>
 #include <QMdiSubWindow>
 #include <QRegularExpression>
@@ -54,9 +70,8 @@ MainWindow::MainWindow(QString commandLine, QWidget *parent)
     m_trayMenu->setDefaultAction(m_ui->mnuAbout);
     wireMenus();
 
-    askPassword = [this]() {
-        return UserDialogs::askText({ this, LoadResString(5011), LoadResString(5010), QString() });
-    };
+    askPassword = [this]() { return askForPassword(this); };
+    wireDialogs();
 
     m_timer1.setInterval(kStartUpDelayMs);
     connect(&m_timer1, &QTimer::timeout, this, &MainWindow::Timer1_Tick);
@@ -84,15 +99,33 @@ void MainWindow::wireMenus()
             [this] { MdiArrangement::tileVertically(m_ui->mdiArea); });
     connect(m_ui->mnuWindowArrangeIcons, &QAction::triggered, this,
             [this] { MdiArrangement::arrangeIcons(m_ui->mdiArea); });
-    // Their windows do not exist yet; the items stay visible but inactive.
-    for (QAction *pending : { m_ui->mnuOptions_0, m_ui->mPassword, m_ui->mPingTool, m_ui->mResolve,
-                              m_ui->mnuHelpContents, m_ui->mnuOrvane, m_ui->mnuHelpAbout, m_ui->mnuAbout })
-        pending->setEnabled(false);
+
     connect(m_ui->mnuWindow, &QMenu::aboutToShow, this, &MainWindow::rebuildWindowMenu);
 
     connect(m_ui->mnuOpen, &QAction::triggered, this, &MainWindow::mnuOpen_Click);
     connect(m_ui->mnuHide, &QAction::triggered, this, &QWidget::hide);
     connect(m_ui->mnuExit, &QAction::triggered, this, &MainWindow::mnuExit_Click);
+}
+
+void MainWindow::wireDialogs()
+{
+    connect(m_ui->mnuOptions_0, &QAction::triggered, this, [this] { showGlobalOptionsDialog(this); });
+    connect(m_ui->mPassword, &QAction::triggered, this, [this] { showSetPasswordDialog(this); });
+    connect(m_ui->mPingTool, &QAction::triggered, this, [this] { showPingDialog(this); });
+    connect(m_ui->mResolve, &QAction::triggered, this, [this] { showResolveDialog(this); });
+    connect(m_ui->mnuHelpAbout, &QAction::triggered, this, [this] { showAboutDialog(this); });
+    connect(m_ui->mnuAbout, &QAction::triggered, this, [this] { showAboutDialog(this); });
+    connect(m_ui->mnuHelpContents, &QAction::triggered, this, &MainWindow::showHelpContents);
+    connect(m_ui->mnuOrvane, &QAction::triggered, this, &MainWindow::showHelpContents);
+}
+
+void MainWindow::showHelpContents()
+{
+    // The manual is the README installed beside the program, until a
+    // manual of its own exists.
+    const QString manual = QDir(QCoreApplication::applicationDirPath()).filePath(QStringLiteral("../README.md"));
+    if (!QFileInfo::exists(manual) || !QDesktopServices::openUrl(QUrl::fromLocalFile(QFileInfo(manual).canonicalFilePath())))
+        QApplication::beep();
 }
 
 void MainWindow::rebuildWindowMenu()
@@ -192,6 +225,7 @@ void MainWindow::StartUpSequence()
     resetBusInFirstCopy();
     autoActivate();
     m_startUpDone = true;
+    notifyServiceReady();
 }
 
 void MainWindow::openCommandChannel()
@@ -205,12 +239,22 @@ void MainWindow::openCommandChannel()
 
 bool MainWindow::handleServiceSwitch(const QString &commandLine)
 {
-    const QString word = commandLine.trimmed().toUpper();
-    static const QStringList switches { "-IH", "/IH", "-I", "/I", "-U", "/U" };
-    if (!switches.contains(word))
+    const ServiceSwitch serviceSwitch = parseServiceSwitch(commandLine);
+    if (serviceSwitch == ServiceSwitch::None)
         return false;
-    QTextStream(stderr) << "velloca: " << word << ": running as a system service is not available yet\n";
-    Q_EMIT finishedEarly(1);
+    const ServiceResult result = runServiceSwitch(serviceSwitch, QCoreApplication::applicationFilePath(), servicePaths);
+    if (result.messageId != 0) {
+        QString text = QString::fromLatin1(kServiceDisplayName) + u' ' + LoadResString(result.messageId);
+        if (!result.detail.isEmpty())
+            text += u'\n' + result.detail;
+        // Without a display nobody would see a box: the terminal gets it.
+        if (QGuiApplication::platformName() == QStringLiteral("offscreen"))
+            QTextStream(stderr) << text << '\n';
+        else
+            UserDialogs::showMessage({ this, text, QStringLiteral("Velloca"),
+                                       result.critical ? UserDialogs::Icon::Critical : UserDialogs::Icon::Information });
+    }
+    Q_EMIT finishedEarly(result.ok ? 0 : 1);
     return true;
 }
 
@@ -282,10 +326,13 @@ SessionWindow *MainWindow::NewSessionWindow()
     auto *engine = new SessionEngine(SessionPlatform::real(virtualPortFolder()));
     auto *window = new SessionWindow(engine);
     engine->setParent(window);
-    window->showIOOptionsDialog = [this, window](bool server) {
-        if (showIOOptionsDialog)
-            showIOOptionsDialog(window, server);
+    window->showIOOptionsDialog = [window](bool server) {
+        if (server)
+            showServerOptionsDialog(window);
+        else
+            showClientOptionsDialog(window);
     };
+    window->showLoginOptionsDialog = [window] { showLoginOptionsDialog(window); };
     QMdiSubWindow *frame = m_ui->mdiArea->addSubWindow(window, Qt::SubWindow | Qt::WindowTitleHint
                                                           | Qt::WindowSystemMenuHint | Qt::WindowMinimizeButtonHint
                                                           | Qt::WindowCloseButtonHint);
@@ -362,6 +409,8 @@ void MainWindow::writeprofilesettings(const QString &fileName)
         config.sessions << window->currentConfiguration();
     writeConfiguration(profile, config, !isMinimized());
     QString error;
+    if (!SetAutoStart(GlobalOptions::global().LoadWithWindows == 1, QCoreApplication::applicationFilePath(), &error))
+        qWarning("velloca: autostart entry not changed: %s", qPrintable(error));
     if (!profile.save(path, &error))
         qWarning("velloca: configuration not saved: %s", qPrintable(error));
 }
@@ -488,6 +537,7 @@ void MainWindow::shutdown()
     if (m_shutDown)
         return;
     m_shutDown = true;
+    notifyServiceStopping();
     m_timer1.stop();
     // Before the configuration was loaded there is nothing to save, and
     // saving would overwrite the file with an empty one.

@@ -1,6 +1,7 @@
 #pragma once
 
 #include "config/ConfigurationFile.h"
+#include "platform/ServiceUnit.h"
 
 #include <QList>
 #include <QMainWindow>
@@ -51,8 +52,8 @@ public:
     // Asks for the password before the window is shown again; replaced by
     // tests. Returns the entry, or nothing when the user cancelled.
     std::function<std::optional<QString>()> askPassword;
-    // Shows the session options dialog of the given role; set by the program.
-    std::function<void(QWidget *parent, bool server)> showIOOptionsDialog;
+    // Where the service switches put the unit and which systemctl they run.
+    ServicePaths servicePaths = defaultServicePaths();
 
     // Menu commands, public so tests and other windows can run them.
     void mnuFileNew_Click();
@@ -77,6 +78,8 @@ private:
     void Timer1_Tick();
     void StartUpSequence();
     bool handleServiceSwitch(const QString &commandLine);
+    void wireDialogs();
+    void showHelpContents();
     void addTrayIcon();
     void openCommandChannel();
     void resetBusInFirstCopy();

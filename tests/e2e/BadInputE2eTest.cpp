@@ -66,7 +66,11 @@ TEST(BadInputE2e, GarbageDefaultFileIsSurvivedAndItsLinesKept)
 
 TEST(BadInputE2e, ServiceSwitchesEndTheProgramWithAMessageAndTouchNothing)
 {
-    for (const QString &word : { QStringLiteral("-I"), QStringLiteral(" -u ") }) {
+    // Only removal is tried, and only where no service is installed: it must
+    // fail with a message. Installing would change the machine's services.
+    if (QFileInfo::exists(QStringLiteral("/etc/systemd/system/velloca.service")))
+        GTEST_SKIP() << "a velloca service is installed on this machine";
+    for (const QString &word : { QStringLiteral(" -u "), QStringLiteral("/U") }) {
         SCOPED_TRACE(qPrintable(word));
         VellocaProcess velloca;
         ASSERT_TRUE(velloca.start(QByteArray(), { word }));
@@ -74,7 +78,7 @@ TEST(BadInputE2e, ServiceSwitchesEndTheProgramWithAMessageAndTouchNothing)
         EXPECT_EQ(velloca.exitStatus(), QProcess::NormalExit);
         EXPECT_EQ(velloca.exitCode(), 1);
         const QByteArray message = velloca.standardError();
-        EXPECT_TRUE(message.contains(word.trimmed().toUpper().toUtf8())) << message.constData();
+        EXPECT_TRUE(message.contains("service did not uninstall successfully.")) << message.constData();
         EXPECT_FALSE(QFileInfo::exists(velloca.defaultConfigPath()));
         EXPECT_FALSE(QFileInfo::exists(velloca.errorLogPath()));
     }

@@ -207,8 +207,15 @@ TEST_F(MainWindowTest, CommandsReachTheSessionNamedByTheirTopic)
 
 TEST_F(MainWindowTest, ServiceSwitchesEndTheProgramBeforeAnythingIsLoaded)
 {
+    // A unit folder that cannot exist and no systemctl: every switch fails
+    // without touching the machine.
+    writeFile(QStringLiteral("blocker"), "a file, not a folder");
+    ServicePaths paths;
+    paths.unitFolder = folder.filePath(QStringLiteral("blocker/units"));
+    paths.systemctl = folder.filePath(QStringLiteral("no-systemctl"));
     for (const char *commandLine : { " -i ", "/U", "-IH" }) {
         MainWindow window(QString::fromLatin1(commandLine));
+        window.servicePaths = paths;
         int status = -1;
         QObject::connect(&window, &MainWindow::finishedEarly, [&](int s) { status = s; });
         window.runStartUpNow();
