@@ -7,6 +7,8 @@
 #include "platform/SocketMember.h"
 #include "platform/VirtualPortControl.h"
 
+#include <QScopedValueRollback>
+
 int SessionEngine::firstConnectedIndex() const
 {
     for (int i = 1; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
@@ -35,13 +37,16 @@ void SessionEngine::DataArrival(int index)
     if (m_record.UseUDP) {
         // A datagram that does not fit is dropped: UDP promises nothing more.
         Add2SerialOutBuffer(member->getData());
-        return;
+    } else {
+        // Over TCP only what fits is read; the rest stays in the socket and
+        // TCP flow control holds the sender until the drain makes room.
+        const qint32 room = m_serialOutBuffer.freeSpace();
+        if (room > 0)
+            Add2SerialOutBuffer(member->getData(room));
     }
-    // Over TCP only what fits is read; the rest stays in the socket and TCP
-    // flow control holds the sender until the drain makes room.
-    const qint32 room = m_serialOutBuffer.freeSpace();
-    if (room > 0)
-        Add2SerialOutBuffer(member->getData(room));
+    // Pass it on now rather than on the next tick: a lone message would
+    // otherwise wait up to a whole tick.
+    drainSerialOutput();
 }
 
 void SessionEngine::resumeNetworkReading()
@@ -59,8 +64,9 @@ void SessionEngine::resumeNetworkReading()
 void SessionEngine::drainSerialOutput()
 {
     const qint32 held = m_serialOutBuffer.count();
-    if (held == 0)
+    if (held == 0 || m_draining)
         return;
+    const QScopedValueRollback<bool> draining(m_draining, true);
     if (m_settings.CreateVirtualPort == 1) {
         if (m_virtualPort->isOpenedByApplication()) {
             // The pty takes what it can; the rest waits for the next tick.

@@ -198,5 +198,6 @@ void SessionEngine::Timer2_Tick()
     }
     drainSerialOutput();
     flushOnTimeout();
+    pingWatchdogStep();
     resumeSerialReading();
 }

@@ -46,8 +46,9 @@ void SessionEngine::ConnectAttempt()
     LogErrors(description);
 }
 
-void SessionEngine::handleConnect(int)
+void SessionEngine::handleConnect(int index)
 {
+    noteNewConnection(index);
     m_timer1.stop();
     setStatusLine(NetworkLine, composeStatus(kNetworkCaption, 5109));
 }
@@ -89,6 +90,7 @@ void SessionEngine::ConnectionRequest(int, qintptr requestId)
         LogErrors(member->errorString());
         return;
     }
+    noteNewConnection(chosen);
     showClientCount();
 }
 
@@ -97,6 +99,7 @@ void SessionEngine::handleClose(int index)
     if (m_closingNow)
         return;
     m_closingNow = true;
+    noteNewConnection(index);
     if (SocketMember *member = socket(index))
         member->close();
     m_record.ClientCount = qMax(0, m_record.ClientCount - 1);

@@ -5,6 +5,7 @@
 #include "SessionRecord.h"
 #include "config/SessionSettings.h"
 
+#include <QHash>
 #include <QObject>
 #include <QStringList>
 #include <QTimer>
@@ -98,6 +99,11 @@ public:
     void Timer2_Tick();
     void ConnectAttempt();
 
+    // Watchdog period in Timer2 ticks for a ping-frequency list index.
+    static int pingPeriodTicks(int pingFrequency);
+    // Watchdog echo requests sent and not yet answered or timed out.
+    int pingsInFlight() const { return m_pingsInFlight; }
+
     static constexpr int kTimer1IntervalMs = 5000;
     static constexpr int kTimer2IntervalMs = 50;
 
@@ -155,6 +161,10 @@ private:
 
     void wirePlatform();
 
+    // Watchdog.
+    void pingWatchdogStep();
+    void noteNewConnection(int index);
+
     SessionPlatform m_platform;
     SessionSettings m_settings;
     SessionRecord m_record;
@@ -175,4 +185,9 @@ private:
     int m_ledTicks = 0;
     bool m_closingNow = false;
     bool m_inSerialReceive = false;
+    bool m_draining = false;
+    int m_pingsInFlight = 0;
+    // Counts the connections each member has carried, so a late answer can
+    // tell whether its connection is still the same one.
+    QHash<int, quint64> m_connectionSerial;
 };

@@ -1,5 +1,6 @@
 #include "SessionPlatform.h"
 
+#include "platform/IcmpEcho.h"
 #include "platform/PortMap.h"
 #include "platform/PtyVirtualPort.h"
 #include "platform/QtSocketMember.h"
@@ -17,5 +18,6 @@ SessionPlatform SessionPlatform::real(const QString &virtualPortFolder)
     platform.makeSocketMember = [](int index, QObject *parent) -> SocketMember * {
         return new QtSocketMember(index, parent);
     };
+    platform.pingRemoteHost = &PingRemoteHost;
     return platform;
 }
