@@ -1,0 +1,137 @@
+// Loading and saving configurations into and from the session windows.
+#include "MainWindow.h"
+#include "ui_MainWindow.h"
+
+#include "config/GlobalOptions.h"
+#include "config/IniProfile.h"
+#include "dialogs/ClientOptionsDialog.h"
+#include "dialogs/LoginOptionsDialog.h"
+#include "dialogs/ServerOptionsDialog.h"
+#include "localisation/ResourceStrings.h"
+#include "platform/AutostartEntry.h"
+#include "platform/PortMap.h"
+#include "platform/VirtualPortFolder.h"
+#include "session/SessionEngine.h"
+#include "session/SessionWindow.h"
+
+#include <QCoreApplication>
+#include <QMdiSubWindow>
+
+#include <cmath>
+
+namespace {
+
+constexpr double kTwipsPerInch = 1440.0;
+
+enum WindowStateValue { StateNormal = 0, StateMinimized = 1, StateMaximized = 2 };
+
+} // namespace
+
+QString MainWindow::virtualPortFolder() const
+{
+    return m_virtualPortFolder.isEmpty() ? defaultVirtualPortFolder() : m_virtualPortFolder;
+}
+
+SessionWindow *MainWindow::NewSessionWindow()
+{
+    auto *engine = new SessionEngine(SessionPlatform::real(virtualPortFolder()));
+    auto *window = new SessionWindow(engine);
+    engine->setParent(window);
+    window->showIOOptionsDialog = [window](bool server) {
+        if (server)
+            showServerOptionsDialog(window);
+        else
+            showClientOptionsDialog(window);
+    };
+    window->showLoginOptionsDialog = [window] { showLoginOptionsDialog(window); };
+    QMdiSubWindow *frame = m_ui->mdiArea->addSubWindow(window, Qt::SubWindow | Qt::WindowTitleHint
+                                                          | Qt::WindowSystemMenuHint | Qt::WindowMinimizeButtonHint
+                                                          | Qt::WindowCloseButtonHint);
+    frame->setAttribute(Qt::WA_DeleteOnClose);
+    engine->setCaption(LoadResString(5119) + QStringLiteral(" - ") + LoadResString(5120));
+    window->show();
+    m_sessions.append(window);
+    m_ui->mnuFileClose->setEnabled(true);
+    return window;
+}
+
+void MainWindow::closeAllSessionWindows()
+{
+    // Deleted at once, newest first, so that their ports are free before a
+    // following load opens them again.
+    const QList<SessionWindow *> windows = sessionWindows();
+    for (auto it = windows.crbegin(); it != windows.crend(); ++it)
+        delete (*it)->parentWidget();
+    m_sessions.clear();
+    m_ui->mnuFileClose->setEnabled(false);
+}
+
+void MainWindow::getprofilesettings(const QString &fileName)
+{
+    const QString path = fileName.isEmpty() ? defaultConfigurationPath() : fileName;
+    closeAllSessionWindows();
+    const Configuration config = readConfiguration(IniProfile::load(path));
+
+    const double dpi = logicalDpiX() > 0 ? logicalDpiX() : 96.0;
+    auto pixels = [dpi](int twips) { return int(std::lround(twips * dpi / kTwipsPerInch)); };
+    move(pixels(config.placement.left), pixels(config.placement.top));
+    resize(qMax(1, pixels(config.placement.width)), qMax(1, pixels(config.placement.height)));
+    if (config.placement.windowState == StateMinimized)
+        setWindowState(Qt::WindowMinimized);
+    else if (config.placement.windowState == StateMaximized)
+        setWindowState(Qt::WindowMaximized);
+    else
+        setWindowState(Qt::WindowNoState);
+
+    GlobalOptions::global() = config.options;
+    PortMap::global().clear();
+    for (auto it = config.ports.cbegin(); it != config.ports.cend(); ++it)
+        PortMap::global().setDevice(it.key(), it.value());
+    m_virtualPortFolder = config.virtualPortFolder;
+
+    if (config.NumSessions == 0) {
+        NewSessionWindow();
+        return;
+    }
+    m_autoActivateList = QList<int>(qMax(0, int(config.sessions.size())) + 2, 0);
+    for (int n = 1; n <= config.sessions.size(); ++n) {
+        const SessionConfig &session = config.sessions[n - 1];
+        NewSessionWindow()->applyConfiguration(session);
+        if (session.AutoActivate == 1)
+            m_autoActivateList[n] = 1;
+    }
+}
+
+void MainWindow::writeprofilesettings(const QString &fileName)
+{
+    const QString path = fileName.isEmpty() ? defaultConfigurationPath() : fileName;
+    IniProfile profile = IniProfile::load(path);
+    Configuration config;
+    const double dpi = logicalDpiX() > 0 ? logicalDpiX() : 96.0;
+    auto twips = [dpi](int pixels) { return int(std::lround(pixels * kTwipsPerInch / dpi)); };
+    const QRect placement = normalGeometry().isValid() ? normalGeometry() : geometry();
+    config.placement.left = twips(x());
+    config.placement.top = twips(y());
+    config.placement.width = twips(placement.width());
+    config.placement.height = twips(placement.height());
+    config.placement.windowState = isMinimized() ? StateMinimized : isMaximized() ? StateMaximized : StateNormal;
+    config.options = GlobalOptions::global();
+    for (SessionWindow *window : sessionWindows())
+        config.sessions << window->currentConfiguration();
+    writeConfiguration(profile, config, !isMinimized());
+    QString error;
+    if (!SetAutoStart(GlobalOptions::global().LoadWithWindows == 1, QCoreApplication::applicationFilePath(), &error))
+        qWarning("velloca: autostart entry not changed: %s", qPrintable(error));
+    if (!profile.save(path, &error))
+        qWarning("velloca: configuration not saved: %s", qPrintable(error));
+}
+
+QList<SessionWindow *> MainWindow::sessionWindows() const
+{
+    QList<SessionWindow *> windows;
+    for (const QPointer<SessionWindow> &window : m_sessions) {
+        if (window)
+            windows << window.data();
+    }
+    return windows;
+}
