@@ -48,8 +48,9 @@ QString sessionSection(int number); // "Session" + number
 
 // A file may claim any NumSessions; at most this many session sections are
 // read, so a damaged or hostile value cannot make the load take unbounded
-// time or memory. NumSessions itself is passed on as read.
-constexpr int kMaxSessionsRead = 1024;
+// time or memory (each session is a window). NumSessions itself is passed
+// on as read.
+constexpr int kMaxSessionsRead = 256;
 
 // Reads every key with the defaults of a load, which differ from a new
 // window's defaults: list indexes 0 except BufferSize 2, empty PortNumber,

@@ -32,6 +32,7 @@ void SessionEngine::DataArrival(int index)
         && index != firstConnectedIndex();
     if (networkIgnored || notFirstClient) {
         member->getData();
+        finishCloseIfDrained(index);
         return;
     }
     if (m_record.UseUDP) {
@@ -47,6 +48,7 @@ void SessionEngine::DataArrival(int index)
     // Pass it on now rather than on the next tick: a lone message would
     // otherwise wait up to a whole tick.
     drainSerialOutput();
+    finishCloseIfDrained(index);
 }
 
 void SessionEngine::resumeNetworkReading()

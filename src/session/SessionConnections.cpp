@@ -21,7 +21,7 @@ void SessionEngine::wireSocket(SocketMember *member)
     connect(member, &SocketMember::dataArrived, this, [this](int index, qint64) { DataArrival(index); });
     connect(member, &SocketMember::connected, this, &SessionEngine::handleConnect);
     connect(member, &SocketMember::connectionRequested, this, &SessionEngine::ConnectionRequest);
-    connect(member, &SocketMember::closed, this, &SessionEngine::handleClose);
+    connect(member, &SocketMember::closed, this, &SessionEngine::handlePeerClose);
     connect(member, &SocketMember::errorOccurred, this, &SessionEngine::handleSocketError);
     // A peer that catches up lets the serial side be read again at once.
     connect(member, &SocketMember::bytesWritten, this, [this](int, qint64) { resumeSerialReading(); });
@@ -94,8 +94,30 @@ void SessionEngine::ConnectionRequest(int, qintptr requestId)
     showClientCount();
 }
 
+void SessionEngine::handlePeerClose(int index)
+{
+    // What the peer sent before it closed is still owed to the serial side:
+    // the close waits until it has been read.
+    SocketMember *member = socket(index);
+    if (!m_record.UseUDP && member && member->bytesAvailable() > 0) {
+        m_closeAfterDrain.insert(index);
+        DataArrival(index);
+        return;
+    }
+    handleClose(index);
+}
+
+void SessionEngine::finishCloseIfDrained(int index)
+{
+    if (!m_closeAfterDrain.contains(index) || socket(index)->bytesAvailable() > 0)
+        return;
+    m_closeAfterDrain.remove(index);
+    handleClose(index);
+}
+
 void SessionEngine::handleClose(int index)
 {
+    m_closeAfterDrain.remove(index);
     if (m_closingNow)
         return;
     m_closingNow = true;

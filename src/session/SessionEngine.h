@@ -7,6 +7,7 @@
 
 #include <QHash>
 #include <QObject>
+#include <QSet>
 #include <QStringList>
 #include <QTimer>
 
@@ -152,6 +153,8 @@ private:
     void handleConnect(int index);
     void ConnectionRequest(int index, qintptr requestId);
     void handleClose(int index);
+    void handlePeerClose(int index);
+    void finishCloseIfDrained(int index);
     void handleSocketError(int index, int number, const QString &description);
     void wireSocket(SocketMember *member);
     bool anyConnected() const;
@@ -190,4 +193,6 @@ private:
     // Counts the connections each member has carried, so a late answer can
     // tell whether its connection is still the same one.
     QHash<int, quint64> m_connectionSerial;
+    // Members closed by their peer whose last bytes are still being read.
+    QSet<int> m_closeAfterDrain;
 };

@@ -31,6 +31,13 @@ SessionWindow::SessionWindow(SessionEngine *engine, QWidget *parent)
 {
     m_ui->setupUi(this);
     layout()->setSizeConstraint(QLayout::SetFixedSize);
+    // Sized by a fixed text length, not by measuring every entry: the
+    // connector list alone has 257, and programs with hundreds of sessions
+    // would spend their start-up measuring them.
+    for (QComboBox *box : findChildren<QComboBox *>()) {
+        box->setSizeAdjustPolicy(QComboBox::AdjustToMinimumContentsLengthWithIcon);
+        box->setMinimumContentsLength(box == m_ui->LocalIP ? 15 : 8);
+    }
 
     ApplyResourceStrings(this);
     PingTimeoutMs = 1000;
@@ -129,7 +136,9 @@ void SessionWindow::bindSettings()
     bindText(m_ui->IPAddress, &SessionSettings::IPAddress);
     bindText(m_ui->PortNumber, &SessionSettings::PortNumber);
     bindText(m_ui->txtTimeoutValue, &SessionSettings::TimeoutValue);
-    connect(m_ui->PortNumber, &QLineEdit::textChanged, this, &SessionWindow::PortNumber_Change);
+    // Only the user's typing is checked: a loaded configuration with a bad
+    // port must not stop an unattended start-up on a box nobody can click.
+    connect(m_ui->PortNumber, &QLineEdit::textEdited, this, &SessionWindow::PortNumber_Change);
     connect(m_ui->LocalIP, &QComboBox::currentTextChanged, this,
             [this](const QString &text) { m_engine->settings().LocalIP = text; });
 

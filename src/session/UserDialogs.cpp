@@ -3,6 +3,7 @@
 #include <QFileDialog>
 #include <QInputDialog>
 #include <QMessageBox>
+#include <QPointer>
 
 namespace UserDialogs {
 namespace {
@@ -43,8 +44,12 @@ void showMessage(const MessageRequest &request)
         messageHandler()(request);
         return;
     }
-    QMessageBox box(toQtIcon(request.icon), request.title, request.text, QMessageBox::Ok, request.parent);
-    box.exec();
+    // On the heap and watched: the program may end while the box waits, and
+    // the parent window then deletes it from under exec().
+    QPointer<QMessageBox> box = new QMessageBox(toQtIcon(request.icon), request.title, request.text,
+                                                QMessageBox::Ok, request.parent);
+    box->exec();
+    delete box.data();
 }
 
 std::optional<QString> askText(const InputRequest &request)
@@ -63,14 +68,17 @@ std::optional<QString> askFileName(const FileRequest &request)
 {
     if (fileHandler())
         return fileHandler()(request);
-    QFileDialog dialog(request.parent, request.title, QString(), request.filter);
-    dialog.setAcceptMode(request.save ? QFileDialog::AcceptSave : QFileDialog::AcceptOpen);
-    dialog.setFileMode(request.save ? QFileDialog::AnyFile : QFileDialog::ExistingFile);
-    dialog.setOption(QFileDialog::DontConfirmOverwrite, request.save);
-    dialog.setDefaultSuffix(request.defaultSuffix);
-    if (dialog.exec() != QDialog::Accepted || dialog.selectedFiles().isEmpty())
+    QPointer<QFileDialog> dialog = new QFileDialog(request.parent, request.title, QString(), request.filter);
+    dialog->setAcceptMode(request.save ? QFileDialog::AcceptSave : QFileDialog::AcceptOpen);
+    dialog->setFileMode(request.save ? QFileDialog::AnyFile : QFileDialog::ExistingFile);
+    dialog->setOption(QFileDialog::DontConfirmOverwrite, request.save);
+    dialog->setDefaultSuffix(request.defaultSuffix);
+    const bool chosen = dialog->exec() == QDialog::Accepted && dialog && !dialog->selectedFiles().isEmpty();
+    const QString file = chosen ? dialog->selectedFiles().constFirst() : QString();
+    delete dialog.data();
+    if (!chosen)
         return std::nullopt;
-    return dialog.selectedFiles().constFirst();
+    return file;
 }
 
 void setFileHandler(FileHandler handler)

@@ -250,8 +250,10 @@ void MainWindow::shutdown()
     // saving would overwrite the file with an empty one.
     if (m_startUpDone)
         writeprofilesettings(QString());
-    closeAllSessionWindows();
     if (m_trayIcon)
         m_trayIcon->hide();
-    QMetaObject::invokeMethod(qApp, &QCoreApplication::quit, Qt::QueuedConnection);
+    // Quitting ends every event loop, also that of a dialog still open; the
+    // session windows go with this window once the program unwinds, never
+    // from under a dialog that is still running.
+    QCoreApplication::quit();
 }

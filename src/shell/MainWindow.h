@@ -46,6 +46,7 @@ public:
     // accepted.
     bool executeCommand(const QString &topic, const QString &command);
     bool startUpDone() const { return m_startUpDone; }
+    bool hasShutDown() const { return m_shutDown; }
     QString currentConfigFile() const { return m_currentConfigFile; }
     bool trayIconAdded() const { return m_trayIcon != nullptr; }
 

@@ -3,6 +3,7 @@
 #include "ui_MainWindow.h"
 
 #include "AppIcon.h"
+#include "ManualLocation.h"
 #include "MdiArrangement.h"
 #include "config/GlobalOptions.h"
 #include "dialogs/AboutDialog.h"
@@ -17,8 +18,6 @@
 #include <QApplication>
 #include <QCursor>
 #include <QDesktopServices>
-#include <QDir>
-#include <QFileInfo>
 #include <QMdiSubWindow>
 #include <QSystemTrayIcon>
 #include <QUrl>
@@ -70,10 +69,8 @@ void MainWindow::wireDialogs()
 
 void MainWindow::showHelpContents()
 {
-    // The manual is the README installed beside the program, until a
-    // manual of its own exists.
-    const QString manual = QDir(QCoreApplication::applicationDirPath()).filePath(QStringLiteral("../README.md"));
-    if (!QFileInfo::exists(manual) || !QDesktopServices::openUrl(QUrl::fromLocalFile(QFileInfo(manual).canonicalFilePath())))
+    const QString manual = manualPath();
+    if (manual.isEmpty() || !QDesktopServices::openUrl(QUrl::fromLocalFile(manual)))
         QApplication::beep();
 }
 

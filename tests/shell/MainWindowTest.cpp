@@ -200,8 +200,8 @@ TEST_F(MainWindowTest, CommandsReachTheSessionNamedByTheirTopic)
 
     // The exit comes on a later tick, after the answer.
     EXPECT_TRUE(window.executeCommand(QStringLiteral("System"), QStringLiteral(" [appexit] ")));
-    EXPECT_FALSE(window.sessionWindows().isEmpty());
-    ASSERT_TRUE(waitUntil([&] { return window.sessionWindows().isEmpty(); }, 5000));
+    EXPECT_FALSE(window.hasShutDown());
+    ASSERT_TRUE(waitUntil([&] { return window.hasShutDown(); }, 5000));
     EXPECT_TRUE(readFile(QStringLiteral("default.vlk")).contains("BaudRate=2"));
 }
 

@@ -11,7 +11,9 @@
 
 PtyPair::PtyPair()
 {
-    m_master = posix_openpt(O_RDWR | O_NOCTTY | O_NONBLOCK);
+    // Close-on-exec: a program under test started later must not inherit
+    // the "cable" end, or closing it here would not unplug anything.
+    m_master = posix_openpt(O_RDWR | O_NOCTTY | O_NONBLOCK | O_CLOEXEC);
     if (m_master < 0)
         return;
     if (grantpt(m_master) != 0 || unlockpt(m_master) != 0) {
@@ -22,7 +24,7 @@ PtyPair::PtyPair()
     m_slavePath = QString::fromLocal8Bit(ptsname(m_master));
     // Keep one slave descriptor open so the tty keeps its settings and the
     // master never sees a hang-up while the code under test reopens it.
-    m_slaveKeepAlive = ::open(ptsname(m_master), O_RDWR | O_NOCTTY | O_NONBLOCK);
+    m_slaveKeepAlive = ::open(ptsname(m_master), O_RDWR | O_NOCTTY | O_NONBLOCK | O_CLOEXEC);
     termios raw {};
     if (m_slaveKeepAlive >= 0 && tcgetattr(m_slaveKeepAlive, &raw) == 0) {
         cfmakeraw(&raw);
