@@ -1,6 +1,6 @@
 #include "IniProfile.h"
 
-#include "AtomicFile.h"
+#include "platform/FileReplace.h"
 
 #include <QFile>
 #include <QFileInfo>
@@ -206,7 +206,8 @@ QString IniProfile::toText() const
 
 bool IniProfile::save(const QString &path, QString *error) const
 {
-    return writeFileAtomically(path, toText().toUtf8(), error);
+    // Mode 0600: the file holds a password.
+    return replaceFileAtomically(path, toText().toUtf8(), error, 0600);
 }
 
 const IniProfile::Line *IniProfile::findKey(const QString &section, const QString &key) const

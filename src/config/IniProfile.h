@@ -38,7 +38,7 @@ public:
     static IniProfile load(const QString &path, QString *error = nullptr);
     static IniProfile fromText(const QString &text);
 
-    // Writes the whole profile atomically (see AtomicFile.h); on failure the
+    // Writes the whole profile atomically (replaceFileAtomically, mode 0600); on failure the
     // old file stays as it was and error names the path and the cause.
     bool save(const QString &path, QString *error = nullptr) const;
     QString toText() const;

@@ -62,6 +62,27 @@ bool writeAll(int fd, const QByteArray &data)
     return true;
 }
 
+// Makes the rename itself durable; a folder that cannot be synced (some
+// file systems refuse) does not make the write fail.
+void syncFolder(const QString &folder)
+{
+    const int fd = ::open(QFile::encodeName(folder).constData(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+    if (fd < 0)
+        return;
+    ::fsync(fd);
+    ::close(fd);
+}
+
+QString resolvedTarget(const QString &path)
+{
+    const QFileInfo info(path);
+    if (!info.isSymLink())
+        return path;
+    // A dangling link still names the file to create.
+    const QString target = info.canonicalFilePath();
+    return target.isEmpty() ? info.symLinkTarget() : target;
+}
+
 } // namespace
 
 bool makeFolderPath(const QString &folder, QString *error)
@@ -80,32 +101,42 @@ bool makeFolderPath(const QString &folder, QString *error)
     return true;
 }
 
-bool replaceFileAtomically(const QString &path, const QByteArray &data, QString *error)
+bool replaceFileAtomically(const QString &path, const QByteArray &data, QString *error, mode_t mode)
 {
-    const QFileInfo target(path);
+    if (path.isEmpty()) {
+        setError(error, QStringLiteral("Cannot write: no file name given"));
+        return false;
+    }
+    // A link stays a link: the file it names is the one replaced.
+    const QString resolved = resolvedTarget(path);
+    const QFileInfo target(resolved);
+    // Hidden, so a folder listing during the write does not show it.
     QByteArray temporary = QFile::encodeName(
         target.absolutePath() + QStringLiteral("/.") + target.fileName() + QStringLiteral(".XXXXXX"));
     const int fd = ::mkstemp(temporary.data());
     if (fd < 0) {
-        setError(error, QStringLiteral("Cannot write %1: %2").arg(path, systemError(errno)));
+        setError(error, QStringLiteral("Cannot write %1: cannot create a temporary file in %2: %3")
+                            .arg(resolved, target.absolutePath(), systemError(errno)));
         return false;
     }
-    const bool written = ::fchmod(fd, 0644) == 0 && writeAll(fd, data) && ::fsync(fd) == 0;
+    // The mode is set explicitly in case the umask or an ACL widened it.
+    const bool written = ::fchmod(fd, mode) == 0 && writeAll(fd, data) && ::fsync(fd) == 0;
     const int writeError = errno;
     const bool closed = ::close(fd) == 0;
     const int closeError = errno;
     if (!written || !closed) {
         ::unlink(temporary.constData());
         setError(error, QStringLiteral("Cannot write %1: %2")
-                            .arg(path, systemError(written ? closeError : writeError)));
+                            .arg(resolved, systemError(written ? closeError : writeError)));
         return false;
     }
-    if (::rename(temporary.constData(), QFile::encodeName(path).constData()) != 0) {
+    if (::rename(temporary.constData(), QFile::encodeName(resolved).constData()) != 0) {
         const int renameError = errno;
         ::unlink(temporary.constData());
-        setError(error, QStringLiteral("Cannot write %1: %2").arg(path, systemError(renameError)));
+        setError(error, QStringLiteral("Cannot write %1: %2").arg(resolved, systemError(renameError)));
         return false;
     }
+    syncFolder(target.absolutePath());
     return true;
 }
 
