@@ -1,6 +1,7 @@
 #pragma once
 
 #include "session/UserDialogs.h"
+#include "support/IcmpPermissions.h"
 
 #include <QAbstractButton>
 #include <QLineEdit>
@@ -60,43 +61,4 @@ inline void click(const QWidget &form, const char *name)
         QTest::mouseClick(button, Qt::LeftButton);
 }
 
-// True when this process may send ICMP echo requests at all.
-inline bool canSendIcmp()
-{
-    for (int type : { SOCK_DGRAM, SOCK_RAW }) {
-        const int fd = ::socket(AF_INET, type | SOCK_CLOEXEC, IPPROTO_ICMP);
-        if (fd >= 0) {
-            ::close(fd);
-            return true;
-        }
-    }
-    return false;
-}
 
-// Takes CAP_NET_RAW out of this thread's effective set, so raw ICMP sockets
-// are refused as they would be for an ordinary user.
-class WithoutRawSockets
-{
-public:
-    WithoutRawSockets()
-    {
-        if (syscall(SYS_capget, &m_header, m_saved) != 0)
-            return;
-        __user_cap_data_struct reduced[2];
-        std::memcpy(reduced, m_saved, sizeof reduced);
-        reduced[CAP_NET_RAW / 32].effective &= ~(1u << (CAP_NET_RAW % 32));
-        m_changed = syscall(SYS_capset, &m_header, reduced) == 0;
-    }
-    ~WithoutRawSockets()
-    {
-        if (m_changed)
-            syscall(SYS_capset, &m_header, m_saved);
-    }
-    WithoutRawSockets(const WithoutRawSockets &) = delete;
-    WithoutRawSockets &operator=(const WithoutRawSockets &) = delete;
-
-private:
-    __user_cap_header_struct m_header { _LINUX_CAPABILITY_VERSION_3, 0 };
-    __user_cap_data_struct m_saved[2] {};
-    bool m_changed = false;
-};

@@ -4,6 +4,7 @@
 #include "platform/IcmpEcho.h"
 #include "platform/IcmpStatus.h"
 
+#include "support/IcmpPermissions.h"
 #include "support/Wait.h"
 
 #include <QDir>
@@ -36,19 +37,6 @@ using namespace Qt::StringLiterals;
 namespace {
 
 constexpr quint32 kLoopbackDecimal = 16777343; // 127.0.0.1 read little-endian
-
-bool canOpenIcmpSocket(int type)
-{
-    const int fd = ::socket(AF_INET, type | SOCK_CLOEXEC, IPPROTO_ICMP);
-    if (fd >= 0)
-        ::close(fd);
-    return fd >= 0;
-}
-
-bool canSendIcmp()
-{
-    return canOpenIcmpSocket(SOCK_DGRAM) || canOpenIcmpSocket(SOCK_RAW);
-}
 
 // Collects the replies of one IcmpEcho by request id.
 struct ReplyLog
@@ -144,32 +132,6 @@ private:
     if (!scope.problem().isEmpty())                                                                \
         GTEST_SKIP() << "needs a network namespace of its own: " << qPrintable(scope.problem())
 
-// Takes CAP_NET_RAW out of this thread's effective set, so raw ICMP sockets
-// are refused as they would be for an ordinary user.
-class WithoutRawSockets
-{
-public:
-    WithoutRawSockets()
-    {
-        if (syscall(SYS_capget, &m_header, m_saved) != 0)
-            return;
-        __user_cap_data_struct reduced[2];
-        std::memcpy(reduced, m_saved, sizeof reduced);
-        reduced[CAP_NET_RAW / 32].effective &= ~(1u << (CAP_NET_RAW % 32));
-        m_changed = syscall(SYS_capset, &m_header, reduced) == 0;
-    }
-    ~WithoutRawSockets()
-    {
-        if (m_changed)
-            syscall(SYS_capset, &m_header, m_saved);
-    }
-    bool changed() const { return m_changed; }
-
-private:
-    __user_cap_header_struct m_header { _LINUX_CAPABILITY_VERSION_3, 0 };
-    __user_cap_data_struct m_saved[2] {};
-    bool m_changed = false;
-};
 
 int openDescriptorCount()
 {
