@@ -4,6 +4,7 @@
 #include "HostAddressText.h"
 #include "LocalAddresses.h"
 
+#include <QCoreApplication>
 #include <QHostInfo>
 #include <QNetworkProxy>
 #include <QScopedValueRollback>
@@ -31,10 +32,11 @@ QSet<qintptr> &pendingRequests()
 }
 
 // Lets a locally closed connection send what is still queued, then deletes
-// it; it no longer belongs to any member.
+// it; it no longer belongs to any member. The application holds it
+// meanwhile, so one still lingering when the program ends is freed too.
 void closeGracefully(QTcpSocket *socket)
 {
-    socket->setParent(nullptr);
+    socket->setParent(QCoreApplication::instance());
     QObject::connect(socket, &QAbstractSocket::disconnected, socket, &QObject::deleteLater);
     if (socket->state() == QAbstractSocket::ConnectedState)
         socket->disconnectFromHost();

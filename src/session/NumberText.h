@@ -7,5 +7,6 @@
 // stops at the first character that does not fit. No number at all is 0.
 double leadingNumber(const QString &text);
 
-// The leading number of a text when it is a whole number above 0, else 0.
+// The leading number of a text, cut to a whole number, when that lies in
+// 1..65535 (the range of resource ids); else 0.
 int leadingPositiveId(const QString &text);
