@@ -183,6 +183,10 @@ void SessionEngine::flushOnTimeout()
 
 void SessionEngine::setLamp(int lamp, bool lit)
 {
+    // Every arrival of data lights a lamp: the ticks that pass it on, flush
+    // it and put the lamp out must run from here on.
+    if (lit)
+        wakeTicks();
     if (m_lampLit[lamp] == lit)
         return;
     m_lampLit[lamp] = lit;
@@ -200,4 +204,21 @@ void SessionEngine::Timer2_Tick()
     flushOnTimeout();
     pingWatchdogStep();
     resumeSerialReading();
+    if (!tickHasWork())
+        m_timer2.stop();
+}
+
+void SessionEngine::wakeTicks()
+{
+    if (!m_timer2.isActive())
+        m_timer2.start();
+}
+
+bool SessionEngine::tickHasWork() const
+{
+    const bool watchdog = isActive() && !m_record.UseUDP && GlobalOptions::global().PingEnabled != 0;
+    const bool serialWaiting = m_serialPort->isOpen() && m_serialPort->inBufferCount() > 0;
+    const bool virtualWaiting = m_settings.CreateVirtualPort == 1 && isActive() && m_virtualPort->available() > 0;
+    return m_lampLit[0] || m_lampLit[1] || m_myBuffer.count() > 0 || m_serialOutBuffer.count() > 0
+        || watchdog || serialWaiting || virtualWaiting || !m_closeAfterDrain.isEmpty();
 }

@@ -55,6 +55,7 @@ void SessionEngine::Command1_Click()
     m_record.UseUDP = m_settings.UseUDP != 0;
     m_record.PingTicks = 0;
     m_timer1.stop();
+    wakeTicks();
     if (isActive())
         deactivate();
     else

@@ -98,6 +98,10 @@ public:
 
     // Timer handlers, public so tests can drive them tick by tick.
     void Timer2_Tick();
+    // Timer2 rests while the session has nothing to do (no traffic, empty
+    // buffers, lamps out, no watchdog): an idle session costs no wake-ups.
+    bool isTicking() const { return m_timer2.isActive(); }
+    void wakeTicks();
     void ConnectAttempt();
 
     // Watchdog period in Timer2 ticks for a ping-frequency list index.
@@ -142,6 +146,7 @@ private:
     void flushOnTimeout();
     void resumeSerialReading();
     void setLamp(int lamp, bool lit);
+    bool tickHasWork() const;
 
     // Network to serial.
     void DataArrival(int index);

@@ -12,6 +12,7 @@
 #include "localisation/ResourceStrings.h"
 #include "nettools/PingDialog.h"
 #include "nettools/ResolveDialog.h"
+#include "session/SessionEngine.h"
 #include "session/SessionWindow.h"
 #include "session/UserDialogs.h"
 
@@ -57,7 +58,12 @@ void MainWindow::wireMenus()
 
 void MainWindow::wireDialogs()
 {
-    connect(m_ui->mnuOptions_0, &QAction::triggered, this, [this] { showGlobalOptionsDialog(this); });
+    connect(m_ui->mnuOptions_0, &QAction::triggered, this, [this] {
+        showGlobalOptionsDialog(this);
+        // A watchdog switched on must start counting in resting sessions.
+        for (SessionWindow *window : sessionWindows())
+            window->engine()->wakeTicks();
+    });
     connect(m_ui->mPassword, &QAction::triggered, this, [this] { showSetPasswordDialog(this); });
     connect(m_ui->mPingTool, &QAction::triggered, this, [this] { showPingDialog(this); });
     connect(m_ui->mResolve, &QAction::triggered, this, [this] { showResolveDialog(this); });

@@ -434,3 +434,33 @@ TEST_F(BridgeTest, VirtualPortClientConnectsOnlyWhileAnApplicationHoldsThePort)
 }
 
 } // namespace
+
+namespace {
+
+TEST_F(BridgeTest, IdleSessionRestsItsTimerAndWakesForTraffic)
+{
+    activateServer();
+    auto client = connectClient();
+    ASSERT_TRUE(waitUntil([&] { return !engine->isTicking(); })) << "an idle session keeps ticking";
+
+    // Traffic either way wakes it, and the data still goes through.
+    ASSERT_TRUE(pty.write("ping"));
+    EXPECT_EQ(readSocket(*client, 4), QByteArray("ping"));
+    client->write("pong");
+    EXPECT_EQ(pty.read(4), QByteArray("pong"));
+    EXPECT_TRUE(waitUntil([&] { return !engine->lampLit(0) && !engine->lampLit(1); })) << "lamps go out by the ticks";
+    EXPECT_TRUE(waitUntil([&] { return !engine->isTicking(); }));
+
+    // Held data waits for its time-out flush, which needs the ticks.
+    engine->settings().WaitForCr = 1;
+    ASSERT_TRUE(pty.write("held"));
+    EXPECT_EQ(readSocket(*client, 4), QByteArray("held"));
+
+    // The watchdog needs them too while it is on.
+    GlobalOptions::global().PingEnabled = 1;
+    engine->wakeTicks();
+    QTest::qWait(200); // a few ticks: it must not go to rest
+    EXPECT_TRUE(engine->isTicking());
+}
+
+} // namespace
