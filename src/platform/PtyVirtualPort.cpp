@@ -1,5 +1,6 @@
 #include "PtyVirtualPort.h"
 
+#include "PtyOpenWatcher.h"
 #include "VirtualPortFolder.h"
 
 #include <QFile>
@@ -11,7 +12,6 @@
 #include <cstring>
 #include <fcntl.h>
 #include <poll.h>
-#include <sys/inotify.h>
 #include <sys/ioctl.h>
 #include <termios.h>
 #include <unistd.h>
@@ -122,19 +122,9 @@ bool PtyVirtualPort::makeSlaveRaw()
 
 void PtyVirtualPort::watchSlave()
 {
-    m_watch = ::inotify_init1(IN_NONBLOCK | IN_CLOEXEC);
-    if (m_watch >= 0
-        && ::inotify_add_watch(m_watch, QFile::encodeName(m_slavePath).constData(),
-                               IN_OPEN | IN_CLOSE_WRITE | IN_CLOSE_NOWRITE) < 0) {
-        ::close(m_watch);
-        m_watch = -1;
-    }
-    if (m_watch < 0) {
+    m_watch = PtyOpenWatcher::instance().watch(m_slavePath, [this](bool sawOpen) { checkAttachment(sawOpen); });
+    if (m_watch < 0)
         m_attachPoll.start();
-        return;
-    }
-    m_watchNotifier = new QSocketNotifier(m_watch, QSocketNotifier::Read, this);
-    connect(m_watchNotifier, &QSocketNotifier::activated, this, &PtyVirtualPort::handleWatchEvents);
 }
 
 bool PtyVirtualPort::removePort()
@@ -150,16 +140,12 @@ bool PtyVirtualPort::removePort()
 void PtyVirtualPort::closeEverything()
 {
     // Deleted later: this may run inside one of their own signals.
-    for (QSocketNotifier *notifier : { m_masterNotifier, m_watchNotifier }) {
-        if (notifier) {
-            notifier->setEnabled(false);
-            notifier->deleteLater();
-        }
+    if (m_masterNotifier) {
+        m_masterNotifier->setEnabled(false);
+        m_masterNotifier->deleteLater();
     }
     m_masterNotifier = nullptr;
-    m_watchNotifier = nullptr;
-    if (m_watch >= 0)
-        ::close(m_watch);
+    PtyOpenWatcher::instance().unwatch(m_watch);
     if (m_master >= 0)
         ::close(m_master);
     m_watch = -1;
@@ -191,26 +177,6 @@ bool PtyVirtualPort::slaveAttached() const
     if (::poll(&state, 1, 0) < 0)
         return false;
     return !(state.revents & POLLHUP);
-}
-
-void PtyVirtualPort::handleWatchEvents()
-{
-    alignas(inotify_event) char buffer[4096];
-    bool sawOpen = false;
-    for (;;) {
-        const ssize_t length = ::read(m_watch, buffer, sizeof buffer);
-        if (length <= 0)
-            break;
-        for (ssize_t offset = 0; offset < length;) {
-            const auto *event = reinterpret_cast<const inotify_event *>(buffer + offset);
-            if (event->mask & IN_OPEN)
-                sawOpen = true;
-            offset += ssize_t(sizeof(inotify_event) + event->len);
-        }
-    }
-    // The events only say that something happened; the master says what
-    // holds now.
-    checkAttachment(sawOpen);
 }
 
 void PtyVirtualPort::checkAttachment(bool sawOpen)

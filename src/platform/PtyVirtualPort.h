@@ -59,7 +59,6 @@ private:
     void closeEverything();
 
     bool slaveAttached() const;
-    void handleWatchEvents();
     void handleMasterActivity();
     void checkAttachment(bool sawOpen);
     void markOpened();
@@ -73,9 +72,8 @@ private:
     QString m_slavePath;
     QString m_errorString;
     int m_master = -1;
-    int m_watch = -1;
+    int m_watch = -1; // id in the shared open watcher
     QSocketNotifier *m_masterNotifier = nullptr;
-    QSocketNotifier *m_watchNotifier = nullptr;
     // Stands in for inotify where it is not available.
     QTimer m_attachPoll;
     // Re-raises dataReceived for input that a receiver left unread.
