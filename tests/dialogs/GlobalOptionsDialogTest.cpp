@@ -365,39 +365,4 @@ QString captionOf(const QWidget &form, const CaptionRow &row)
     return {};
 }
 
-TEST_F(GlobalOptionsDialogTest, ModalFormWithCaptionsFromItsTagsInEitherLanguage)
-{
-    GlobalOptions::global() = someOptions();
-    {
-        UiLanguageScope english(UiLanguage::English);
-        GlobalOptionsDialog dialog;
-        EXPECT_EQ(dialog.objectName(), u"frmOptions"_s);
-        EXPECT_TRUE(dialog.isModal());
-        for (const CaptionRow &row : kCaptions) {
-            SCOPED_TRACE(row.id);
-            const QObject *element = *row.control ? dialog.findChild<QObject *>(QString::fromLatin1(row.control))
-                                                  : &dialog;
-            ASSERT_NE(element, nullptr);
-            EXPECT_EQ(element->property("tag").toString(), QString::number(row.id));
-            EXPECT_EQ(captionOf(dialog, row), QString::fromUtf8(row.english));
-        }
-    }
-    {
-        UiLanguageScope japanese(UiLanguage::Japanese);
-        GlobalOptionsDialog dialog;
-        for (const CaptionRow &row : kCaptions) {
-            SCOPED_TRACE(row.id);
-            EXPECT_EQ(captionOf(dialog, row), LoadResString(row.id));
-        }
-        EXPECT_NE(dialog.windowTitle(), u"Velloca Options"_s);
-        EXPECT_EQ(dialog.font().family(), LoadResString(20));
-        // The list entries are the same in every language.
-        EXPECT_EQ(list(dialog, "Combo2")->currentText(), u"10 Seconds"_s);
-        EXPECT_EQ(list(dialog, "Combo3")->currentText(), u"1000 ms"_s);
-        // The values load and store the same way.
-        dialog.accept();
-        expectOptions(someOptions());
-    }
-}
-
 } // namespace

@@ -113,38 +113,6 @@ TEST(ResourceStrings, TableHoldsEveryIdentifierInBothLanguages)
     }
 }
 
-TEST(ResourceStrings, EnglishTextsAreExact)
-{
-    UiLanguageScope english(UiLanguage::English);
-    const std::map<int, QString> expected = {
-        { 20, QStringLiteral("Ms Sans Serif") },
-        { 21, QStringLiteral("0") },
-        { 1207, QStringLiteral("&OK") },
-        { 2102, QStringLiteral("&File") },
-        { 2106, QStringLiteral("Save &As...") },
-        { 2214, QStringLiteral("Xon/Xoff") },
-        { 4032, QStringLiteral("File is not a valid configuration file.") },
-        { 5014, QStringLiteral("2-Way I/O options:") },
-        { 5031, QStringLiteral("Load Velloca with Windows at startup") },
-        { 5058, QStringLiteral("RS232 to TCP/IP Converter") },
-        { 5073, QStringLiteral("System Information Is Unavailable At This Time") },
-        { 5082, QStringLiteral("COM Status: Error - ") },
-        { 5083, QStringLiteral("TCP/IP Status: Error - ") },
-        { 5099, QStringLiteral("Error -") },
-        { 5102, QStringLiteral("Port numbers must range between 0 and 65565") },
-        { 5115, QStringLiteral("Cannot resolve the IP Address for host name:") },
-        { 5118, QStringLiteral("De-Activate") },
-        { 5124, QStringLiteral("Enter the Workstation Name or the URL for the computer that you want to find the IP Address of") },
-    };
-    for (const auto &[id, text] : expected)
-        EXPECT_EQ(LoadResString(id), text) << id;
-
-    for (int unknown : { 0, -1, 1, 5060, 5121, 65535, 70000 }) {
-        EXPECT_FALSE(hasResString(unknown)) << unknown;
-        EXPECT_TRUE(LoadResString(unknown).isNull()) << unknown;
-    }
-}
-
 TEST(ResourceStrings, JapaneseFontAndSampleTexts)
 {
     UiLanguageScope japanese(UiLanguage::Japanese);
