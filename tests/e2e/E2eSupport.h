@@ -1,5 +1,7 @@
 #pragma once
 
+#include "support/FdIo.h"
+
 #include <QByteArray>
 #include <QString>
 
@@ -31,11 +33,7 @@ QString iniValue(const QString &text, const QString &section, const QString &key
 QByteArray readFromSocket(QTcpSocket &socket, int count, int timeoutMs = 10000);
 
 // Writes all bytes to a non-blocking descriptor, running the event loop
-// while the descriptor is full.
-bool writeToFd(int fd, const QByteArray &bytes, int timeoutMs = 10000);
 // Reads from a non-blocking descriptor until `count` bytes have arrived or
-// the time is up, running the event loop meanwhile.
-QByteArray readFromFd(int fd, int count, int timeoutMs = 10000);
 
 // Equal byte arrays; otherwise says the sizes and the first difference
 // instead of printing kilobytes of binary.

@@ -1,5 +1,7 @@
 #include "PtyPair.h"
 
+#include "FdIo.h"
+
 #include <QDeadlineTimer>
 #include <QCoreApplication>
 
@@ -41,40 +43,12 @@ PtyPair::~PtyPair()
 
 bool PtyPair::write(const QByteArray &bytes)
 {
-    qsizetype done = 0;
-    QDeadlineTimer deadline(10000);
-    while (done < bytes.size() && !deadline.hasExpired()) {
-        const ssize_t n = ::write(m_master, bytes.constData() + done, size_t(bytes.size() - done));
-        if (n > 0) {
-            done += n;
-            continue;
-        }
-        if (n < 0 && errno != EAGAIN && errno != EINTR)
-            return false;
-        // The slave's input queue is full: let the code under test read.
-        QCoreApplication::processEvents(QEventLoop::AllEvents, 10);
-        pollfd p { m_master, POLLOUT, 0 };
-        ::poll(&p, 1, 5);
-    }
-    return done == bytes.size();
+    return writeToFd(m_master, bytes);
 }
 
 QByteArray PtyPair::read(int count, int timeoutMs)
 {
-    QByteArray result;
-    QDeadlineTimer deadline(timeoutMs);
-    char chunk[65536];
-    while (result.size() < count && !deadline.hasExpired()) {
-        const ssize_t n = ::read(m_master, chunk, sizeof chunk);
-        if (n > 0) {
-            result.append(chunk, n);
-            continue;
-        }
-        QCoreApplication::processEvents(QEventLoop::AllEvents, 10);
-        pollfd p { m_master, POLLIN, 0 };
-        ::poll(&p, 1, 5);
-    }
-    return result;
+    return readFromFd(m_master, count, timeoutMs);
 }
 
 termios PtyPair::slaveTermios() const
