@@ -111,8 +111,9 @@ IniProfile IniProfile::load(const QString &path, QString *error)
         return IniProfile();
     }
     // Read one byte past the limit to notice an oversized file even when it
-    // grows while being read.
-    const QByteArray bytes = file.read(kMaxFileSize + 1);
+    // grows while being read. The request is sized by the file, because
+    // QFile sets aside the whole amount asked for before reading.
+    const QByteArray bytes = file.read(qMin(file.size(), kMaxFileSize) + 1);
     if (bytes.size() > kMaxFileSize || bytes.count('\n') >= kMaxLineCount) {
         if (error) {
             *error = QStringLiteral("%1 is too large for a configuration file (at most %2 bytes "

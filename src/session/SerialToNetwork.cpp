@@ -97,11 +97,13 @@ void SessionEngine::moveSerialInput(const std::function<qint64()> &pending,
     const bool packetMode = m_settings.WaitForCr != 0;
     // Read only what the hold buffer can take; the rest stays in the port
     // until sending makes room (nothing is read just to be dropped).
-    while (pending() > 0) {
+    // Each read asks for no more than is waiting: a QIODevice sets aside the
+    // whole amount asked for before it reads.
+    for (qint64 waiting = pending(); waiting > 0; waiting = pending()) {
         const qint32 room = serialReadRoom();
         if (room <= 0)
             break;
-        Add2MyBuffer(read(room));
+        Add2MyBuffer(read(qint32(qMin<qint64>(room, waiting))));
         sendHeldData(packetMode, mayHold);
     }
     if (packetMode && pending() == 0)

@@ -12,7 +12,9 @@
 #include "platform/LocalAddresses.h"
 #include "platform/SocketMember.h"
 
+#include <QCoreApplication>
 #include <QEvent>
+#include <QStringListModel>
 
 namespace {
 
@@ -24,6 +26,20 @@ void fillFromIds(QComboBox *box, const auto &ids)
         box->addItem(LoadResString(id));
 }
 
+// The connector list is the same 257 entries in every session and is never
+// edited (no insertion), so all sessions share one model instead of each
+// holding 257 items of its own.
+QStringListModel *connectorModel()
+{
+    static QStringListModel *model = [] {
+        QStringList names;
+        for (int n = 0; n < SessionLists::kConnectorCount; ++n)
+            names << SessionLists::connectorName(n);
+        return new QStringListModel(names, QCoreApplication::instance());
+    }();
+    return model;
+}
+
 } // namespace
 
 SessionWindow::SessionWindow(SessionEngine *engine, QWidget *parent)
@@ -31,10 +47,12 @@ SessionWindow::SessionWindow(SessionEngine *engine, QWidget *parent)
 {
     m_ui->setupUi(this);
     layout()->setSizeConstraint(QLayout::SetFixedSize);
-    // Sized by a fixed text length, not by measuring every entry: the
-    // connector list alone has 257, and programs with hundreds of sessions
-    // would spend their start-up measuring them.
-    for (QComboBox *box : findChildren<QComboBox *>()) {
+    // The editable boxes are sized by a fixed text length, not by measuring
+    // every entry: the connector list alone has 257, and programs with
+    // hundreds of sessions would spend their start-up measuring them. The
+    // short lists keep Qt's sizing by content; a size policy would build
+    // their pop-up lists at once, over 10 KiB each in every session.
+    for (QComboBox *box : { m_ui->Combo2, m_ui->LocalIP }) {
         box->setSizeAdjustPolicy(QComboBox::AdjustToMinimumContentsLengthWithIcon);
         box->setMinimumContentsLength(box == m_ui->LocalIP ? 15 : 8);
     }
@@ -55,8 +73,7 @@ SessionWindow::~SessionWindow() = default;
 
 void SessionWindow::fillLists()
 {
-    for (int n = 0; n < SessionLists::kConnectorCount; ++n)
-        m_ui->Combo2->addItem(SessionLists::connectorName(n));
+    m_ui->Combo2->setModel(connectorModel());
     m_ui->Combo2->setCurrentIndex(0);
     m_ui->Combo1_0->addItems(SessionLists::kBaudRates);
     m_ui->Combo1_0->setCurrentIndex(6);
