@@ -89,18 +89,6 @@ QString tagOf(const QObject *object)
     return object->property("tag").toString();
 }
 
-QFont localisedFont(const QFont &designed)
-{
-    QFont font = designed;
-    if (const std::optional<QString> family = resourceText(kFontFamilyId))
-        font.setFamily(*family);
-    // String 21 names a Windows character set. Qt chooses glyphs by writing
-    // system through font fallback, so the character set has no counterpart
-    // here: Japanese text renders with the family above or its fallback.
-    font.setPointSize(kFontPointSize);
-    font.setBold(false);
-    return font;
-}
 
 // Widgets whose child widgets are parts of them (a combo box's line edit, a
 // view's viewport and header) rather than controls of the form.
@@ -133,6 +121,7 @@ public:
             localiseMenuActions({ menu->menuAction() });
 
         keepDesignedFonts();
+        giveFonts();
     }
 
 private:
@@ -166,8 +155,19 @@ private:
 
     void giveFont(QWidget *widget)
     {
-        widget->setFont(m_font);
         m_givenFont.insert(widget);
+    }
+
+    // Runs after keepDesignedFonts, so nothing changes a font after this. A
+    // control that already shows the font is left alone: setting it again
+    // would still send a font change, and a combo box answers that by
+    // building its pop-up list.
+    void giveFonts()
+    {
+        for (const Pinned &control : std::as_const(m_controls)) {
+            if (m_givenFont.contains(control.widget) && control.widget->font() != m_font)
+                control.widget->setFont(m_font);
+        }
     }
 
     void localise(QWidget *widget)
@@ -284,7 +284,10 @@ private:
             for (const Pinned &control : *list) {
                 if (m_givenFont.contains(control.widget))
                     continue;
-                if (control.widget->font() == control.designedFont)
+                // Safe to leave: a font of its own, or an inherited one that
+                // giving the localised font to a parent cannot change.
+                const bool ownFont = control.widget->testAttribute(Qt::WA_SetFont);
+                if (control.widget->font() == control.designedFont && (ownFont || control.designedFont == m_font))
                     continue;
                 // An inherited font carries no resolved properties, and
                 // setting it as is would just inherit again.
@@ -305,6 +308,19 @@ private:
 };
 
 } // namespace
+
+QFont localisedFont(const QFont &designed)
+{
+    QFont font = designed;
+    if (const std::optional<QString> family = resourceText(kFontFamilyId))
+        font.setFamily(*family);
+    // String 21 names a Windows character set. Qt chooses glyphs by writing
+    // system through font fallback, so the character set has no counterpart
+    // here: Japanese text renders with the family above or its fallback.
+    font.setPointSize(kFontPointSize);
+    font.setBold(false);
+    return font;
+}
 
 void ApplyResourceStrings(QWidget *form)
 {

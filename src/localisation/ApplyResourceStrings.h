@@ -1,5 +1,6 @@
 #pragma once
 
+class QFont;
 class QWidget;
 
 // Localises a form from the string table, first thing when it loads: the
@@ -37,3 +38,8 @@ class QWidget;
 // as do embedded MDI sub-windows, which are forms of their own. Child windows
 // (dialogs) are left to localise themselves.
 void ApplyResourceStrings(QWidget *form);
+
+// The localised font for a form designed with `designed`. A form that sets
+// it before creating its controls lets them start with it, so no control
+// has to take a font change later.
+QFont localisedFont(const QFont &designed);

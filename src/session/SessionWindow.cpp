@@ -45,6 +45,9 @@ QStringListModel *connectorModel()
 SessionWindow::SessionWindow(SessionEngine *engine, QWidget *parent)
     : QWidget(parent), m_ui(std::make_unique<Ui::SessionWindow>()), m_engine(engine)
 {
+    // The controls start with the language's font: a combo box given a font
+    // afterwards builds its pop-up list at once, in every session.
+    setFont(localisedFont(font()));
     m_ui->setupUi(this);
     layout()->setSizeConstraint(QLayout::SetFixedSize);
     // The editable boxes are sized by a fixed text length, not by measuring
