@@ -15,6 +15,7 @@
 #include <QRadioButton>
 #include <QSignalSpy>
 #include <QTcpSocket>
+#include <QTest>
 #include <QTemporaryDir>
 
 #include <gtest/gtest.h>
@@ -164,6 +165,20 @@ TEST_F(SessionWindowTest, ConnectorChoiceSetsTheCommandTopicAndTypedTextSelectsN
     connector->setEditText(QStringLiteral("my port"));
     EXPECT_EQ(engine.settings().Connector, -1);
     EXPECT_EQ(engine.settings().ConnectorText, QStringLiteral("my port"));
+
+    // Every session lists the same connectors but keeps its own choice, and
+    // typed text never adds to the list the others see.
+    QTemporaryDir otherFolder;
+    SessionEngine otherEngine { SessionPlatform::real(otherFolder.path()) };
+    SessionWindow other { &otherEngine };
+    auto *otherConnector = other.findChild<QComboBox *>(QStringLiteral("Combo2"));
+    ASSERT_NE(otherConnector, nullptr);
+    otherConnector->setCurrentIndex(7);
+    QTest::keyClick(connector->lineEdit(), Qt::Key_Return);
+    EXPECT_EQ(otherConnector->count(), 257);
+    EXPECT_EQ(otherConnector->currentText(), QStringLiteral("COM7"));
+    EXPECT_EQ(connector->currentText(), QStringLiteral("my port"));
+    EXPECT_EQ(otherEngine.settings().Connector, 7);
 }
 
 TEST_F(SessionWindowTest, SetWindowNameKeepsTheCaptionOnEmptyOrCancel)
