@@ -99,9 +99,11 @@ void SessionEngine::moveSerialInput(const std::function<qint64()> &pending,
     // until sending makes room (nothing is read just to be dropped).
     // Each read asks for no more than is waiting: a QIODevice sets aside the
     // whole amount asked for before it reads.
+    m_serialInputHeld = false;
     for (qint64 waiting = pending(); waiting > 0; waiting = pending()) {
         const qint32 room = serialReadRoom();
-        if (room <= 0)
+        m_serialInputHeld = room <= 0;
+        if (m_serialInputHeld)
             break;
         Add2MyBuffer(read(qint32(qMin<qint64>(room, waiting))));
         sendHeldData(packetMode, mayHold);

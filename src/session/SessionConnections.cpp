@@ -23,8 +23,14 @@ void SessionEngine::wireSocket(SocketMember *member)
     connect(member, &SocketMember::connectionRequested, this, &SessionEngine::ConnectionRequest);
     connect(member, &SocketMember::closed, this, &SessionEngine::handlePeerClose);
     connect(member, &SocketMember::errorOccurred, this, &SessionEngine::handleSocketError);
-    // A peer that catches up lets the serial side be read again at once.
-    connect(member, &SocketMember::bytesWritten, this, [this](int, qint64) { resumeSerialReading(); });
+    // A peer that catches up lets held serial input be read again at once.
+    // Only then: every client reports every write, and checking the room
+    // asks every client, which with a thousand clients is a million calls
+    // for each block sent.
+    connect(member, &SocketMember::bytesWritten, this, [this](int, qint64) {
+        if (m_serialInputHeld)
+            resumeSerialReading();
+    });
     member->setReadBufferSize(kSocketReadAhead);
 }
 

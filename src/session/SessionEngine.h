@@ -193,6 +193,8 @@ private:
     int m_ledTicks = 0;
     bool m_closingNow = false;
     bool m_inSerialReceive = false;
+    // Serial input waits for room: a client's queue or the hold buffer is full.
+    bool m_serialInputHeld = false;
     bool m_draining = false;
     int m_pingsInFlight = 0;
     // Counts the connections each member has carried, so a late answer can
