@@ -89,7 +89,6 @@ QString tagOf(const QObject *object)
     return object->property("tag").toString();
 }
 
-
 // Widgets whose child widgets are parts of them (a combo box's line edit, a
 // view's viewport and header) rather than controls of the form.
 bool isCompoundControl(const QWidget *widget)

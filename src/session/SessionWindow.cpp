@@ -26,9 +26,9 @@ void fillFromIds(QComboBox *box, const auto &ids)
         box->addItem(LoadResString(id));
 }
 
-// The connector list is the same 257 entries in every session and is never
-// edited (no insertion), so all sessions share one model instead of each
-// holding 257 items of its own.
+// The connector list is the same 257 entries in every session, in the one
+// language of the program's life, and is never edited (no insertion), so all
+// sessions share one model instead of each holding 257 items of its own.
 QStringListModel *connectorModel()
 {
     static QStringListModel *model = [] {
