@@ -296,16 +296,17 @@ class ProcSample:
             fields = f.read().rsplit(")", 1)[1].split()
         # utime and stime are fields 14 and 15; fields[0] is field 3.
         self.cpu_seconds = (int(fields[11]) + int(fields[12])) / CLOCK_TICKS
-        self.voluntary = self.involuntary = 0
-        self.threads = 0
+        # Per thread: a thread that ends between two samples takes its
+        # count with it, so only threads seen in both are compared.
+        self.switches = {}
         for tid in os.listdir(f"/proc/{pid}/task"):
             try:
                 status = _status_fields(f"/proc/{pid}/task/{tid}/status")
             except OSError:
                 continue  # the thread ended meanwhile
-            self.voluntary += status.get("voluntary_ctxt_switches", 0)
-            self.involuntary += status.get("nonvoluntary_ctxt_switches", 0)
-            self.threads += 1
+            self.switches[tid] = (status.get("voluntary_ctxt_switches", 0),
+                                  status.get("nonvoluntary_ctxt_switches", 0))
+        self.threads = len(self.switches)
         status = _status_fields(f"/proc/{pid}/status")
         self.rss_kib = status.get("VmRSS", 0)
         self.hwm_kib = status.get("VmHWM", 0)
@@ -327,14 +328,20 @@ def usage_between(before, after):
     """CPU share of one core (%) and wake-ups per second between two samples."""
     wall = after.time - before.time
     cpu = after.cpu_seconds - before.cpu_seconds
-    switches = (after.voluntary + after.involuntary) - (before.voluntary + before.involuntary)
+    # A thread that started in between counts from zero.
+    voluntary = involuntary = 0
+    for tid, (vol, invol) in after.switches.items():
+        was_vol, was_invol = before.switches.get(tid, (0, 0))
+        voluntary += vol - was_vol
+        involuntary += invol - was_invol
+    switches = voluntary + involuntary
     return {
         "wall_s": round(wall, 3),
         "cpu_s": round(cpu, 3),
         "cpu_percent_of_one_core": round(100.0 * cpu / wall, 3) if wall > 0 else None,
         "wakeups_per_s": round(switches / wall, 2) if wall > 0 else None,
-        "voluntary_per_s": round((after.voluntary - before.voluntary) / wall, 2) if wall > 0 else None,
-        "involuntary_per_s": round((after.involuntary - before.involuntary) / wall, 2) if wall > 0 else None,
+        "voluntary_per_s": round(voluntary / wall, 2) if wall > 0 else None,
+        "involuntary_per_s": round(involuntary / wall, 2) if wall > 0 else None,
         "rss_kib": after.rss_kib,
         "peak_rss_kib": after.hwm_kib,
         "threads": after.threads,
