@@ -9,6 +9,7 @@
 
 #include <cerrno>
 #include <fcntl.h>
+#include <sys/statvfs.h>
 #include <unistd.h>
 
 namespace {
@@ -19,6 +20,18 @@ QString withoutLineBreaks(QString text)
     text.replace(QLatin1Char('\r'), QLatin1Char(' '));
     text.replace(QLatin1Char('\n'), QLatin1Char(' '));
     return text;
+}
+
+// A nearly full disk takes only part of a line, and every later line would
+// then run on from the torn one: a line that may not fit is not started.
+// Whole free blocks are counted, so this errs on the side of dropping.
+bool hasRoomFor(int fd, qsizetype bytes)
+{
+    struct statvfs disk {};
+    // Some file systems report no sizes at all; those are simply tried.
+    if (::fstatvfs(fd, &disk) != 0 || disk.f_blocks == 0)
+        return true;
+    return qulonglong(disk.f_bavail) * disk.f_frsize >= qulonglong(bytes);
 }
 
 // Several sessions, and several copies of the program, append to the same
@@ -32,10 +45,12 @@ void appendLine(const QString &path, const QByteArray &line)
                           O_WRONLY | O_APPEND | O_CREAT | O_CLOEXEC | O_NONBLOCK, 0666);
     if (fd < 0)
         return;
-    ssize_t written;
-    do {
-        written = ::write(fd, line.constData(), size_t(line.size()));
-    } while (written < 0 && errno == EINTR);
+    if (hasRoomFor(fd, line.size())) {
+        ssize_t written;
+        do {
+            written = ::write(fd, line.constData(), size_t(line.size()));
+        } while (written < 0 && errno == EINTR);
+    }
     ::close(fd);
 }
 

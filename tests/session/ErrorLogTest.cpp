@@ -6,10 +6,14 @@
 #include <QDir>
 #include <QFile>
 #include <QLocale>
+#include <QScopeGuard>
 #include <QTemporaryDir>
 
 #include <gtest/gtest.h>
 
+#include <cerrno>
+#include <cstring>
+#include <sys/mount.h>
 #include <unistd.h>
 
 namespace {
@@ -174,6 +178,57 @@ TEST_F(ErrorLogTest, ErrorProgramStartsOnEveryCall)
     EXPECT_TRUE(waitUntil([&] { return fileContents(marker) == "alarm\nalarm\n"; }))
         << fileContents(marker).toStdString();
     EXPECT_FALSE(QFile::exists(logPath()));
+}
+
+TEST_F(ErrorLogTest, FullDiskLosesOnlyTheLinesThatDoNotFit)
+{
+    // A small tmpfs, filled up, stands in for a full disk.
+    QTemporaryDir mountPoint;
+    const QByteArray target = QFile::encodeName(mountPoint.path());
+    if (::mount("tmpfs", target.constData(), "tmpfs", 0, "size=64k") != 0)
+        GTEST_SKIP() << "cannot mount a small tmpfs here (" << std::strerror(errno) << "), which needs root";
+    const auto unmount = qScopeGuard([&] { ::umount2(target.constData(), MNT_DETACH); });
+    setProgramFolderForTesting(mountPoint.path());
+    const QString log = mountPoint.filePath(QStringLiteral("errorlog.txt"));
+    GlobalOptions options;
+    options.LogErrors = 1;
+    writeErrorLogLine(clientContext(), QStringLiteral("before"), options, kMoment);
+    const QByteArray before = fileContents(log);
+    ASSERT_TRUE(before.endsWith("\r\n"));
+
+    QFile filler(mountPoint.filePath(QStringLiteral("filler")));
+    ASSERT_TRUE(filler.open(QIODevice::WriteOnly | QIODevice::Unbuffered));
+    const QByteArray block(4096, 'x');
+    while (filler.write(block) == block.size()) {
+    }
+    const QString longMessage(6000, QLatin1Char('y'));
+    writeErrorLogLine(clientContext(), longMessage, options, kMoment);
+    EXPECT_EQ(fileContents(log), before) << "a torn line was left in the log";
+
+    // With room again, the next line starts on a line of its own.
+    filler.close();
+    ASSERT_TRUE(filler.remove());
+    writeErrorLogLine(clientContext(), QStringLiteral("after"), options, kMoment);
+    EXPECT_EQ(fileContents(log),
+              before + (errorLogLine(clientContext(), QStringLiteral("after"), kMoment) + QStringLiteral("\r\n")).toUtf8());
+}
+
+TEST_F(ErrorLogTest, ErrorProgramNeverGoesThroughAShell)
+{
+    const QString script = m_folder.filePath(QStringLiteral("record.sh"));
+    ASSERT_TRUE(writeScript(script, "#!/bin/sh\nout=$1; shift; printf '%s|' \"$@\" >> \"$out\"\n"));
+    const QString marker = m_folder.filePath(QStringLiteral("arguments.txt"));
+    const QString planted = m_folder.filePath(QStringLiteral("planted"));
+
+    GlobalOptions options;
+    options.OnErrorRunApp = QStringLiteral("\"%1\" \"%2\" a;b $(touch %3) `touch %3` | touch %3 && touch %3")
+                                .arg(script, marker, planted);
+    writeErrorLogLine(clientContext(), QStringLiteral("one"), options, kMoment);
+
+    EXPECT_TRUE(waitUntil([&] { return !fileContents(marker).isEmpty(); }));
+    EXPECT_EQ(fileContents(marker),
+              QStringLiteral("a;b|$(touch|%1)|`touch|%1`|||touch|%1|&&|touch|%1|").arg(planted).toUtf8());
+    EXPECT_FALSE(QFile::exists(planted));
 }
 
 TEST_F(ErrorLogTest, MissingErrorProgramIsPassedOver)
