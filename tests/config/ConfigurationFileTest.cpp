@@ -367,12 +367,3 @@ TEST(ConfigurationFile, BadValuesStayBounded)
               QStringLiteral("10000"));
     EXPECT_LT(timer.elapsed(), 30000);
 }
-
-TEST(ConfigurationFile, DefaultPathIsInTheProgramFolder)
-{
-    QTemporaryDir dir;
-    ASSERT_TRUE(dir.isValid());
-    setProgramFolderForTesting(dir.path());
-    EXPECT_EQ(defaultConfigurationPath(), dir.filePath(QStringLiteral("default.vlk")));
-    setProgramFolderForTesting(QString());
-}

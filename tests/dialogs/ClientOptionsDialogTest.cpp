@@ -29,32 +29,6 @@ struct ClientOptionsDialogTest : ::testing::Test
     TransferScope transfer;
 };
 
-TEST_F(ClientOptionsDialogTest, LoadShowsTheTransferValuesAndOptionZeroForUnknownOnes)
-{
-    struct Row
-    {
-        int clientOptions, connectOnVirtualOpen;
-        int shownOption;
-        bool checked;
-    };
-    const Row rows[] = {
-        { 0, 0, 0, false },
-        { 1, 1, 1, true },
-        // A client session with output to the network disabled.
-        { 2, 0, 2, false },
-        { 3, 2, 0, false },
-        { -1, -1, 0, false },
-    };
-    for (const Row &row : rows) {
-        SCOPED_TRACE(testing::Message() << row.clientOptions << ' ' << row.connectOnVirtualOpen);
-        setTransfer(row.clientOptions, row.connectOnVirtualOpen);
-        ClientOptionsDialog dialog;
-        EXPECT_EQ(checkedOption(dialog, u"Option1"_s), row.shownOption);
-        EXPECT_EQ(control<QCheckBox>(dialog, u"chkConnectOnVirtualPort"_s)->isChecked(), row.checked);
-        expectTransfer(row.clientOptions, row.connectOnVirtualOpen);
-    }
-}
-
 TEST_F(ClientOptionsDialogTest, OkStoresTheEditedValues)
 {
     setTransfer(2, 1);
@@ -103,18 +77,6 @@ TEST_F(ClientOptionsDialogTest, CancelMarksTheClientOptionsAndLeavesTheRest)
     EXPECT_EQ(dialog.result(), QDialog::Rejected);
     EXPECT_FALSE(dialog.isVisible());
     expectTransfer(OptionsTransfer::kCancelled, 1);
-}
-
-TEST_F(ClientOptionsDialogTest, ClosingByTheFrameStoresNothing)
-{
-    setTransfer(1, 0);
-    ClientOptionsDialog dialog;
-    dialog.show();
-    clickControl(dialog, "Option1_2");
-    clickControl(dialog, "chkConnectOnVirtualPort");
-    EXPECT_TRUE(dialog.close());
-    EXPECT_EQ(dialog.result(), QDialog::Rejected);
-    expectTransfer(1, 0);
 }
 
 TEST_F(ClientOptionsDialogTest, EscPressesOkAndEnterOnlyAFocusedButton)

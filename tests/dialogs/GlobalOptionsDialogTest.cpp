@@ -47,14 +47,6 @@ void expectOptions(const GlobalOptions &expected)
     EXPECT_EQ(o.LoadWithWindows, expected.LoadWithWindows);
 }
 
-QStringList entries(const QComboBox *list)
-{
-    QStringList texts;
-    for (int i = 0; i < list->count(); ++i)
-        texts << list->itemText(i);
-    return texts;
-}
-
 // The global options and the file box answer of one test stay in that test.
 class GlobalOptionsDialogTest : public ::testing::Test
 {
@@ -111,51 +103,6 @@ protected:
 private:
     GlobalOptions m_saved;
 };
-
-TEST_F(GlobalOptionsDialogTest, LoadShowsTheGlobalOptionsInFreshlyFilledLists)
-{
-    GlobalOptions::global() = someOptions();
-    {
-        GlobalOptionsDialog dialog;
-        EXPECT_EQ(commandLine(dialog)->text(), someOptions().OnErrorRunApp);
-        EXPECT_TRUE(control<QCheckBox>(dialog, u"Check1"_s)->isChecked());
-        EXPECT_TRUE(control<QCheckBox>(dialog, u"Check2"_s)->isChecked());
-        EXPECT_TRUE(control<QCheckBox>(dialog, u"chkLoadWithWindows"_s)->isChecked());
-
-        QComboBox *packetSize = list(dialog, "Combo1");
-        EXPECT_TRUE(packetSize->isEditable());
-        EXPECT_EQ(entries(packetSize),
-                  QStringList({ u"50"_s, u"100"_s, u"200"_s, u"500"_s, u"1000"_s, u"2000"_s, u"4000"_s }));
-        // Not a list entry, shown as typed.
-        EXPECT_EQ(packetSize->currentText(), u"1500"_s);
-
-        QComboBox *frequency = list(dialog, "Combo2");
-        EXPECT_FALSE(frequency->isEditable());
-        EXPECT_EQ(entries(frequency),
-                  QStringList({ u".5 Second"_s, u"1 Second"_s, u"5 Seconds"_s, u"10 Seconds"_s, u"15 Seconds"_s,
-                                u"20 Seconds"_s, u"25 Seconds"_s, u"30 Seconds"_s, u"35 Seconds"_s,
-                                u"40 Seconds"_s, u"45 Seconds"_s, u"50 Seconds"_s, u"55 Seconds"_s,
-                                u"60 Seconds"_s }));
-        EXPECT_EQ(frequency->currentText(), u"10 Seconds"_s);
-
-        QComboBox *timeout = list(dialog, "Combo3");
-        EXPECT_FALSE(timeout->isEditable());
-        ASSERT_EQ(timeout->count(), 20);
-        for (int i = 0; i < 20; ++i)
-            EXPECT_EQ(timeout->itemText(i), QString::number(100 * (i + 1)) + u" ms"_s);
-        EXPECT_EQ(timeout->currentText(), u"1000 ms"_s);
-    }
-    // Before any configuration every number is 0; a check value other than 1
-    // shows unchecked. Loading alone writes nothing back.
-    GlobalOptions::global() = GlobalOptions {};
-    GlobalOptions::global().LogErrors = 2;
-    GlobalOptionsDialog dialog;
-    EXPECT_FALSE(control<QCheckBox>(dialog, u"Check1"_s)->isChecked());
-    EXPECT_EQ(list(dialog, "Combo1")->currentText(), u"0"_s);
-    EXPECT_EQ(list(dialog, "Combo2")->currentText(), u".5 Second"_s);
-    EXPECT_EQ(list(dialog, "Combo3")->currentText(), u"100 ms"_s);
-    EXPECT_EQ(GlobalOptions::global().LogErrors, 2);
-}
 
 TEST_F(GlobalOptionsDialogTest, UnknownListIndexesShowNoSelectionAndSurviveOkUnlessPicked)
 {
@@ -325,44 +272,6 @@ TEST_F(GlobalOptionsDialogTest, OnlyOkStoresAndEnterInATextBoxPressesIt)
     EXPECT_FALSE(second.isVisible());
     EXPECT_EQ(GlobalOptions::global().PacketSize, 3000);
     EXPECT_EQ(list(second, "Combo1")->count(), 7);
-}
-
-struct CaptionRow
-{
-    const char *control; // empty for the form itself
-    int id;
-    const char *english;
-};
-
-const CaptionRow kCaptions[] = {
-    { "", 5029, "Velloca Options" },
-    { "Label2", 5030, "Max bytes per TCP/IP packet:" },
-    { "chkLoadWithWindows", 5031, "Load Velloca with Windows at startup" },
-    { "Check1", 5032, "Log all errors to file: ErrorLog.txt" },
-    { "Frame1", 5033, "Run external program when errors occur:" },
-    { "Label1", 5034, "Command Line:" },
-    { "Command1", 5035, "Browse..." },
-    { "Frame2", 5036, "Ping remote IP Addresses to detect failed connections:" },
-    { "Check2", 5037, "Enable remote pings" },
-    { "Label3", 5038, "Ping frequency (secs):" },
-    { "Label4", 5039, "Ping Timeout (ms):" },
-    { "Command2", 1207, "&OK" },
-    { "Command3", 1208, "&Cancel" },
-};
-
-QString captionOf(const QWidget &form, const CaptionRow &row)
-{
-    if (!*row.control)
-        return form.windowTitle();
-    const QWidget *widget = control<QWidget>(form, QString::fromLatin1(row.control));
-    if (auto *button = qobject_cast<const QAbstractButton *>(widget))
-        return button->text();
-    if (auto *frame = qobject_cast<const QGroupBox *>(widget))
-        return frame->title();
-    if (auto *label = qobject_cast<const QLabel *>(widget))
-        return label->text();
-    ADD_FAILURE() << row.control << " has no caption";
-    return {};
 }
 
 } // namespace

@@ -51,28 +51,6 @@ struct LoginOptionsDialogTest : ::testing::Test
     const QStringList defaults{ u"Username:"_s, QString(), u"Password:"_s, QString() };
 };
 
-TEST_F(LoginOptionsDialogTest, LoadShowsTheTransferTextsInClearUnderEnglishCaptionsInEveryLanguage)
-{
-    UiLanguageScope japanese(UiLanguage::Japanese);
-    setTexts({ u"login: "_s, u"operator"_s, u" Password?"_s, u"s3cr3t!"_s });
-    LoginOptionsDialog dialog;
-
-    EXPECT_EQ(dialog.objectName(), u"frmLogin"_s);
-    EXPECT_TRUE(dialog.isModal());
-    EXPECT_EQ(dialog.windowTitle(), u"Client Login Options"_s);
-    EXPECT_EQ(shownTexts(dialog), transferTexts());
-    for (const char *name : kBoxes)
-        EXPECT_EQ(control<QLineEdit>(dialog, QString::fromLatin1(name))->echoMode(), QLineEdit::Normal) << name;
-
-    QStringList captions;
-    for (const char *name : { "Label1", "Label2", "Label3", "Label4" })
-        captions << control<QLabel>(dialog, QString::fromLatin1(name))->text();
-    EXPECT_EQ(captions, (QStringList{ u"Username Prompt:"_s, u"Username Prompt Response:"_s, u"Password Prompt:"_s,
-                                      u"Password Prompt Response:"_s }));
-    EXPECT_EQ(control<QPushButton>(dialog, u"btnOK"_s)->text(), u"&OK"_s);
-    EXPECT_EQ(control<QPushButton>(dialog, u"btnCancel"_s)->text(), u"&Cancel"_s);
-}
-
 TEST_F(LoginOptionsDialogTest, OkStoresTheTextsExactlyAndClearsTheCancelFlag)
 {
     struct Row

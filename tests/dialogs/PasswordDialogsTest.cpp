@@ -53,36 +53,6 @@ private:
     QString m_savedPassword = GlobalOptions::global().Password;
 };
 
-TEST_F(PasswordDialogsTest, SetPasswordFormIsLocalisedCentredAndShowsTheCurrentPasswordMasked)
-{
-    password() = u"Tr4y Lock"_s;
-    {
-        UiLanguageScope english(UiLanguage::English);
-        SetPasswordDialog dialog;
-        dialog.show();
-        EXPECT_EQ(dialog.objectName(), u"Form1"_s);
-        EXPECT_TRUE(dialog.isModal());
-        EXPECT_EQ(dialog.windowTitle(), u"Velloca Password"_s);
-        EXPECT_EQ(control<QLabel>(dialog, u"Label1"_s)->text(), u"Enter Password:"_s);
-        EXPECT_EQ(control<QLabel>(dialog, u"Label2"_s)->text(), u"Confirm Password"_s);
-        EXPECT_TRUE(control<QPushButton>(dialog, u"Command1"_s)->isDefault());
-        EXPECT_EQ(textOf(dialog, "Text1"), password());
-        EXPECT_EQ(textOf(dialog, "Text2"), password());
-        expectMasked(dialog, "Text1");
-        expectMasked(dialog, "Text2");
-        expectCentred(dialog);
-    }
-    {
-        UiLanguageScope japanese(UiLanguage::Japanese);
-        SetPasswordDialog dialog;
-        EXPECT_EQ(dialog.windowTitle(), LoadResString(5010));
-        EXPECT_EQ(control<QLabel>(dialog, u"Label1"_s)->text(), LoadResString(5011));
-        EXPECT_EQ(control<QLabel>(dialog, u"Label2"_s)->text(), LoadResString(5012));
-        EXPECT_EQ(control<QPushButton>(dialog, u"Command2"_s)->text(), LoadResString(1208));
-        EXPECT_EQ(dialog.font().family(), LoadResString(20));
-    }
-}
-
 TEST_F(PasswordDialogsTest, SetPasswordKeepsTheDialogOpenUntilTheConfirmationMatches)
 {
     password() = u"old"_s;

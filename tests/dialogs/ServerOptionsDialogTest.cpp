@@ -31,34 +31,6 @@ struct ServerOptionsDialogTest : ::testing::Test
     TransferScope transfer;
 };
 
-TEST_F(ServerOptionsDialogTest, LoadShowsTheTransferValuesAndOptionZeroForUnknownOnes)
-{
-    struct Row
-    {
-        int multi, serial, tcp;
-        bool checked;
-        int shownSerial, shownTcp;
-    };
-    const Row rows[] = {
-        { 0, 0, 0, false, 0, 0 },
-        { 1, 1, 2, true, 1, 2 },
-        { 0, 2, 1, false, 2, 1 },
-        // Only a hand-edited configuration file gets such values this far.
-        { 2, 3, -1, false, 0, 0 },
-        { -1, -5, 7, false, 0, 0 },
-    };
-    for (const Row &row : rows) {
-        SCOPED_TRACE(testing::Message() << row.multi << ' ' << row.serial << ' ' << row.tcp);
-        setTransfer(row.multi, row.serial, row.tcp);
-        ServerOptionsDialog dialog;
-        EXPECT_EQ(control<QCheckBox>(dialog, u"chkMultiClients"_s)->isChecked(), row.checked);
-        EXPECT_EQ(checkedOption(dialog, u"OptionSerial"_s), row.shownSerial);
-        EXPECT_EQ(checkedOption(dialog, u"OptionTCP"_s), row.shownTcp);
-        // Loading alone writes nothing back.
-        expectTransfer(row.multi, row.serial, row.tcp);
-    }
-}
-
 TEST_F(ServerOptionsDialogTest, OkStoresTheEditedValues)
 {
     // Unchanged: the same three values come back.
@@ -114,18 +86,6 @@ TEST_F(ServerOptionsDialogTest, CancelMarksTheMultiClientValueAndLeavesTheRest)
     EXPECT_EQ(dialog.result(), QDialog::Rejected);
     EXPECT_FALSE(dialog.isVisible());
     expectTransfer(OptionsTransfer::kCancelled, 2, 1);
-}
-
-TEST_F(ServerOptionsDialogTest, ClosingByTheFrameStoresNothing)
-{
-    setTransfer(1, 2, 1);
-    ServerOptionsDialog dialog;
-    dialog.show();
-    clickControl(dialog, "OptionSerial_1");
-    clickControl(dialog, "chkMultiClients");
-    EXPECT_TRUE(dialog.close());
-    EXPECT_EQ(dialog.result(), QDialog::Rejected);
-    expectTransfer(1, 2, 1);
 }
 
 TEST_F(ServerOptionsDialogTest, EscPressesCancelAndEnterOnlyAFocusedButton)

@@ -113,17 +113,6 @@ TEST(ResourceStrings, TableHoldsEveryIdentifierInBothLanguages)
     }
 }
 
-TEST(ResourceStrings, JapaneseFontAndSampleTexts)
-{
-    UiLanguageScope japanese(UiLanguage::Japanese);
-    EXPECT_EQ(LoadResString(20), QStringLiteral("Noto Sans CJK JP"));
-    EXPECT_EQ(LoadResString(21), QStringLiteral("128"));
-    EXPECT_EQ(LoadResString(2102), QStringLiteral("ファイル(&F)"));
-    EXPECT_EQ(LoadResString(5082), QStringLiteral("COM 状態: エラー - "));
-    // Status lines are joined as caption, blank, state.
-    EXPECT_EQ(LoadResString(5091) + u' ' + LoadResString(5097), QStringLiteral("TCP/IP 状態: 接続中..."));
-}
-
 TEST(ResourceStrings, SystemLanguageFollowsLocaleEnvironment)
 {
     EnvironmentScope environment;

@@ -37,19 +37,6 @@ TEST(PingCodeTest, EveryPingTakesItsTimeoutFromTheGlobalOption)
     echo.cancelAll();
 }
 
-TEST(PingCodeTest, StatusTextKnowsTheCurrentTimeout)
-{
-    PingGlobalsScope scope;
-    PingTimeoutMs = 1000;
-    EXPECT_EQ(GetStatusCode(1000), u"1000   [Ping Timeout]"_s);
-    EXPECT_EQ(GetStatusCode(11010), u"11010   [IP Request Timed Out]"_s);
-    EXPECT_EQ(GetStatusCode(-1), u"-1   [Bad IP Format]"_s);
-    GlobalOptions::global().PingTimeout = 0;
-    EXPECT_EQ(refreshPingTimeoutMs(), 100);
-    EXPECT_EQ(GetStatusCode(1000), u"1000   [Unknown Message Returned]"_s);
-    EXPECT_EQ(GetStatusCode(100), u"100   [Ping Timeout]"_s);
-}
-
 TEST(PingCodeTest, DataTextIsSentAndEchoedUnchanged)
 {
     PingGlobalsScope scope;

@@ -52,28 +52,6 @@ struct PingDialogTest : ::testing::Test
     MessageRecorder recorder;
 };
 
-TEST_F(PingDialogTest, FormCarriesItsCaptionsTooltipsAndDefaults)
-{
-    PingDialog dialog;
-    EXPECT_EQ(dialog.objectName(), u"frmPing"_s);
-    EXPECT_EQ(dialog.windowTitle(), LoadResString(5040));
-    const std::pair<const char *, int> labels[] = { { "Label1_0", 5041 }, { "Label2", 5042 },
-                                                    { "Label1_1", 5044 }, { "Label1_2", 5045 },
-                                                    { "Label1_3", 5046 }, { "Label1_4", 5047 },
-                                                    { "Label1_5", 5048 } };
-    for (const auto &[name, id] : labels)
-        EXPECT_EQ(control<QLabel>(dialog, name)->text(), LoadResString(id)) << name;
-    EXPECT_EQ(control<QGroupBox>(dialog, "Frame1")->title(), LoadResString(5043));
-    EXPECT_EQ(control<QPushButton>(dialog, "Command1")->text(), LoadResString(5049));
-    EXPECT_EQ(control<QPushButton>(dialog, "Command3")->text(), LoadResString(5050));
-    EXPECT_TRUE(control<QPushButton>(dialog, "Command1")->isDefault());
-    EXPECT_EQ(control<QLineEdit>(dialog, "Text1")->toolTip(), LoadResString(5122));
-    EXPECT_EQ(control<QLineEdit>(dialog, "Text2")->toolTip(), LoadResString(5123));
-    EXPECT_EQ(textOf(dialog, "Text1"), QString());
-    EXPECT_EQ(textOf(dialog, "Text2"), u"Testing 123"_s);
-    EXPECT_EQ(results(dialog), QStringList(5, QString()));
-}
-
 TEST_F(PingDialogTest, EmptyHostAsksForOneAndSendsNothing)
 {
     PingDialog dialog;
@@ -154,20 +132,6 @@ TEST_F(PingDialogTest, ClosingWhileAPingIsPendingIsSafe)
     QObject context;
     GetIPFromHostName(u"localhost"_s, &context, [&](const QString &) { done = true; });
     EXPECT_TRUE(waitUntil([&] { return done; }, 30000));
-}
-
-TEST_F(PingDialogTest, ShowPingDialogIsModalAndReturnsOnCancel)
-{
-    QString seenTitle;
-    QTimer::singleShot(0, [&] {
-        QWidget *modal = QApplication::activeModalWidget();
-        ASSERT_NE(modal, nullptr);
-        EXPECT_EQ(modal->objectName(), u"frmPing"_s);
-        seenTitle = modal->windowTitle();
-        click(*modal, "Command3");
-    });
-    showPingDialog(nullptr);
-    EXPECT_EQ(seenTitle, LoadResString(5040));
 }
 
 } // namespace

@@ -30,24 +30,6 @@ struct ResolveDialogTest : ::testing::Test
     MessageRecorder recorder;
 };
 
-TEST_F(ResolveDialogTest, FormCarriesItsCaptionsTooltipAndHiddenHelp)
-{
-    ResolveDialog dialog;
-    dialog.show();
-    EXPECT_EQ(dialog.objectName(), u"frmResolve"_s);
-    EXPECT_EQ(dialog.windowTitle(), LoadResString(5051));
-    EXPECT_EQ(control<QLabel>(dialog, "Label1")->text(), LoadResString(5052));
-    EXPECT_EQ(control<QLabel>(dialog, "Label2")->text(), LoadResString(5053));
-    EXPECT_EQ(control<QPushButton>(dialog, "Command1")->text(), LoadResString(5055));
-    EXPECT_EQ(control<QPushButton>(dialog, "Command3")->text(), LoadResString(5054));
-    EXPECT_EQ(control<QPushButton>(dialog, "Command4")->text(), LoadResString(5056));
-    EXPECT_TRUE(control<QPushButton>(dialog, "Command1")->isDefault());
-    EXPECT_FALSE(control<QPushButton>(dialog, "Command3")->isVisible());
-    EXPECT_EQ(control<QLineEdit>(dialog, "txtHostName")->toolTip(), LoadResString(5124));
-    EXPECT_EQ(textOf(dialog, "txtHostName"), QString());
-    EXPECT_EQ(textOf(dialog, "txtIPAddress"), QString());
-}
-
 TEST_F(ResolveDialogTest, NamesAndAddressesResolve)
 {
     ResolveDialog dialog;
@@ -73,31 +55,6 @@ TEST_F(ResolveDialogTest, UnresolvableNameIsReportedAndTheAddressKept)
         EXPECT_EQ(recorder.messages[0].title, u"Velloca"_s);
         EXPECT_EQ(textOf(dialog, "txtIPAddress"), u"10.1.2.3"_s);
     }
-}
-
-TEST_F(ResolveDialogTest, HelpDoesNothingAndCancelCloses)
-{
-    ResolveDialog dialog;
-    dialog.show();
-    control<QPushButton>(dialog, "Command3")->click();
-    EXPECT_TRUE(dialog.isVisible());
-    EXPECT_TRUE(recorder.messages.empty());
-    click(dialog, "Command4");
-    EXPECT_FALSE(dialog.isVisible());
-    EXPECT_EQ(dialog.result(), QDialog::Rejected);
-}
-
-TEST_F(ResolveDialogTest, ShowResolveDialogIsModalAndReturnsOnCancel)
-{
-    QString seenName;
-    QTimer::singleShot(0, [&] {
-        QWidget *modal = QApplication::activeModalWidget();
-        ASSERT_NE(modal, nullptr);
-        seenName = modal->objectName();
-        click(*modal, "Command4");
-    });
-    showResolveDialog(nullptr);
-    EXPECT_EQ(seenName, u"frmResolve"_s);
 }
 
 } // namespace

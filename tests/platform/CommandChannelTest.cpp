@@ -187,62 +187,6 @@ TEST(CommandChannelTest, RefusesFoldersOthersCouldTamperWith)
     EXPECT_TRUE(error.contains(deep)) << error.toStdString();
 }
 
-TEST(CommandChannelTest, AnswersPipelinedRequestsInOrder)
-{
-    QTemporaryDir temporary;
-    Recorder recorder;
-    CommandChannel channel(recorder.handler());
-    ASSERT_TRUE(channel.listen(temporary.path()));
-
-    Client client(channel.socketPath());
-    QByteArray burst;
-    QList<QByteArray> expected;
-    for (int i = 0; i < 100; ++i) {
-        const bool accept = i % 3 != 0;
-        burst += QByteArray("Session") + QByteArray::number(i) + '\t' + (accept ? "[ok " : "[no ")
-            + QByteArray::number(i) + (i % 2 ? "]\r\n" : "]\n");
-        expected.append(accept ? "accepted" : "refused");
-    }
-    client.send(burst);
-    ASSERT_TRUE(client.waitReplies(100));
-    EXPECT_EQ(client.replies, expected);
-    ASSERT_EQ(recorder.calls.size(), 100);
-    EXPECT_EQ(recorder.calls[7], (Call { "Session7", "[ok 7]" }));
-
-    // Text after the first tab is the command, tabs and all; UTF-8 arrives intact.
-    client.send("COM3\t  [activate]\tx \nSitzung \xc3\xbc\t[ok \xe2\x82\xac]\n");
-    ASSERT_TRUE(client.waitReplies(102));
-    EXPECT_EQ(recorder.calls[100], (Call { "COM3", "  [activate]\tx " }));
-    EXPECT_EQ(recorder.calls[101], (Call { QString::fromUtf8("Sitzung \xc3\xbc"), QString::fromUtf8("[ok \xe2\x82\xac]") }));
-    EXPECT_EQ(client.replies.last(), "accepted");
-}
-
-TEST(CommandChannelTest, AnswersFiftyConcurrentClientsEachInOrder)
-{
-    QTemporaryDir temporary;
-    Recorder recorder;
-    CommandChannel channel(recorder.handler());
-    ASSERT_TRUE(channel.listen(temporary.path()));
-
-    std::vector<std::unique_ptr<Client>> clients;
-    for (int i = 0; i < 50; ++i)
-        clients.push_back(std::make_unique<Client>(channel.socketPath()));
-    for (int i = 0; i < 50; ++i) {
-        const QByteArray topic = "C" + QByteArray::number(i) + '\t';
-        clients[i]->send(topic + (i % 2 ? "[ok]\n" : "[no]\n") + topic + "[ok]\n" + topic
-                         + (i % 2 ? "[no]\n" : "[ok]\n"));
-    }
-    for (int i = 0; i < 50; ++i) {
-        ASSERT_TRUE(clients[i]->waitReplies(3)) << "client " << i;
-        const QList<QByteArray> expected = i % 2
-            ? QList<QByteArray> { "accepted", "accepted", "refused" }
-            : QList<QByteArray> { "refused", "accepted", "accepted" };
-        EXPECT_EQ(clients[i]->replies, expected) << "client " << i;
-    }
-    EXPECT_EQ(recorder.calls.size(), 150);
-    EXPECT_EQ(channel.connectionCount(), 50);
-}
-
 TEST(CommandChannelTest, RefusesMalformedLinesWithoutCallingTheHandler)
 {
     QTemporaryDir temporary;
@@ -263,38 +207,6 @@ TEST(CommandChannelTest, RefusesMalformedLinesWithoutCallingTheHandler)
     EXPECT_EQ(client.replies,
               QList<QByteArray>({ "refused", "refused", "refused", "refused", "refused", "refused", "accepted" }));
     EXPECT_EQ(recorder.calls, QList<Call>({ { "COM1", "[ok]" } }));
-}
-
-TEST(CommandChannelTest, BoundsLineLengthAndClosesOnOverlongLines)
-{
-    QTemporaryDir temporary;
-    Recorder recorder;
-    CommandChannel channel(recorder.handler());
-    ASSERT_TRUE(channel.listen(temporary.path()));
-
-    // The longest allowed line still counts, with or without CR.
-    const QByteArray prefix = "T\t[ok";
-    const QByteArray longest = prefix + QByteArray(kCommandLineMaxLength - prefix.size(), 'x');
-    Client atLimit(channel.socketPath());
-    atLimit.send(longest + "\r\n" + longest + "\n");
-    ASSERT_TRUE(atLimit.waitReplies(2));
-    EXPECT_EQ(atLimit.replies, QList<QByteArray>({ "accepted", "accepted" }));
-
-    Client oneOver(channel.socketPath());
-    oneOver.send(longest + "y\n" + "T\t[ok]\n");
-    ASSERT_TRUE(oneOver.waitClosedByServer());
-    EXPECT_EQ(oneOver.replies, QList<QByteArray>({ "refused" }));
-
-    // A megabyte without a newline is cut off long before its end.
-    Client flood(channel.socketPath());
-    qint64 flooded = 0;
-    QObject::connect(&flood.socket, &QLocalSocket::bytesWritten, [&](qint64 bytes) { flooded += bytes; });
-    flood.send(QByteArray(1024 * 1024, 'z'));
-    ASSERT_TRUE(flood.waitClosedByServer());
-    EXPECT_EQ(flood.replies, QList<QByteArray>({ "refused" }));
-    EXPECT_LT(flooded, 1024 * 1024);
-    EXPECT_EQ(recorder.calls.size(), 2);
-    EXPECT_TRUE(waitUntil([&] { return channel.connectionCount() == 1 && openSockets(channel) == 1; }));
 }
 
 // While a request waits for the handler, its connection is read no further:

@@ -103,17 +103,6 @@ TEST(ServiceSwitch, OnlyTheWholeTrimmedCommandLineIsASwitch)
         EXPECT_EQ(parseServiceSwitch(QString::fromUtf8(c.commandLine)), c.expected) << c.commandLine;
 }
 
-TEST(ServiceUnit, DefaultsFollowTheUserRunningTheInstall)
-{
-    const ServicePaths paths = defaultServicePaths();
-    const QString configHome = QStandardPaths::writableLocation(QStandardPaths::GenericConfigLocation);
-    EXPECT_EQ(paths.configHome, configHome);
-    EXPECT_EQ(paths.systemScope, ::geteuid() == 0);
-    EXPECT_EQ(paths.unitFolder, ::geteuid() == 0 ? QStringLiteral("/etc/systemd/system")
-                                                 : configHome + QStringLiteral("/systemd/user"));
-    EXPECT_EQ(paths.commandTimeoutMs, 30000);
-}
-
 TEST_F(ServiceUnitTest, PlainInstallWaitsForTheNetworkAndEnablesTheUserUnit)
 {
     const QString program = QStringLiteral("/opt/My Programs/velloca");

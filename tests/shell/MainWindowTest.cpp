@@ -80,20 +80,6 @@ TEST_F(MainWindowTest, StartsWithOneNewSessionWhenThereIsNoConfiguration)
     EXPECT_EQ(popup->defaultAction(), action(window, "mnuAbout"));
 }
 
-TEST_F(MainWindowTest, CloseIsGreyedWithoutSessionsAndNewEnablesIt)
-{
-    MainWindow window { QString() };
-    window.runStartUpNow();
-    QAction *close = action(window, "mnuFileClose");
-    EXPECT_TRUE(close->isEnabled());
-    window.mnuFileClose_Click();
-    ASSERT_TRUE(waitUntil([&] { return window.sessionWindows().isEmpty(); }));
-    Q_EMIT window.findChild<QMenu *>(QStringLiteral("mnuFile"))->aboutToShow();
-    EXPECT_FALSE(close->isEnabled());
-    window.mnuFileNew_Click();
-    EXPECT_TRUE(close->isEnabled());
-}
-
 TEST_F(MainWindowTest, SaveAsksForAFileUntilOneIsChosen)
 {
     MainWindow window { QString() };
