@@ -1,4 +1,6 @@
 #include "PingDialog.h"
+
+#include "BusyForm.h"
 #include "ui_PingDialog.h"
 
 #include "PingCode.h"
@@ -79,11 +81,7 @@ void PingDialog::clearResults()
 void PingDialog::setBusy(bool busy)
 {
     m_busy = busy;
-    m_ui->Command1->setEnabled(!busy);
-    if (busy)
-        setCursor(Qt::BusyCursor);
-    else
-        unsetCursor();
+    showBusy(this, m_ui->Command1, busy);
 }
 
 void showPingDialog(QWidget *parent)

@@ -1,4 +1,6 @@
 #include "ResolveDialog.h"
+
+#include "BusyForm.h"
 #include "ui_ResolveDialog.h"
 
 #include "localisation/ApplyResourceStrings.h"
@@ -53,11 +55,7 @@ void ResolveDialog::showAddress(const QString &hostName, const QString &address)
 void ResolveDialog::setBusy(bool busy)
 {
     m_busy = busy;
-    m_ui->Command1->setEnabled(!busy);
-    if (busy)
-        setCursor(Qt::BusyCursor);
-    else
-        unsetCursor();
+    showBusy(this, m_ui->Command1, busy);
 }
 
 void showResolveDialog(QWidget *parent)

@@ -85,6 +85,20 @@ EchoReply failure(int status, bool sent = false)
     return reply;
 }
 
+// One datagram into `data`, its sender into `from` and its ancillary data
+// into `control`.
+msghdr messageHeader(iovec &data, sockaddr_in &from, char *control, size_t controlSize)
+{
+    msghdr message {};
+    message.msg_name = &from;
+    message.msg_namelen = sizeof from;
+    message.msg_iov = &data;
+    message.msg_iovlen = 1;
+    message.msg_control = control;
+    message.msg_controllen = controlSize;
+    return message;
+}
+
 } // namespace
 
 QByteArray EchoReply::addressBytes() const
@@ -230,13 +244,7 @@ private:
         char control[512];
         sockaddr_in from {};
         iovec iov { payload, sizeof payload };
-        msghdr message {};
-        message.msg_name = &from;
-        message.msg_namelen = sizeof from;
-        message.msg_iov = &iov;
-        message.msg_iovlen = 1;
-        message.msg_control = control;
-        message.msg_controllen = sizeof control;
+        msghdr message = messageHeader(iov, from, control, sizeof control);
         const ssize_t size = ::recvmsg(m_fd, &message, MSG_ERRQUEUE | MSG_DONTWAIT);
         if (size < 0)
             return false;
@@ -271,13 +279,7 @@ private:
         char control[256];
         sockaddr_in from {};
         iovec iov { buffer.data(), size_t(buffer.size()) };
-        msghdr message {};
-        message.msg_name = &from;
-        message.msg_namelen = sizeof from;
-        message.msg_iov = &iov;
-        message.msg_iovlen = 1;
-        message.msg_control = control;
-        message.msg_controllen = sizeof control;
+        msghdr message = messageHeader(iov, from, control, sizeof control);
         const ssize_t size = ::recvmsg(m_fd, &message, MSG_DONTWAIT);
         if (size < 0) {
             // A pending socket error (EHOSTUNREACH …) is read here once; its
