@@ -5,6 +5,7 @@
 #include <QRegularExpression>
 
 #include <algorithm>
+#include <climits>
 
 namespace {
 
@@ -118,6 +119,44 @@ void writeSession(IniProfile &profile, const QString &section, const SessionConf
     text("SessionDescription", s.SessionDescription);
 }
 
+// The number of a "SessionN" section name, or 0.
+qint64 sessionNumber(const QString &sectionName)
+{
+    static const QRegularExpression name(QStringLiteral("^Session([1-9][0-9]{0,17})$"),
+                                         QRegularExpression::CaseInsensitiveOption);
+    const QRegularExpressionMatch match = name.match(sectionName.trimmed());
+    return match.hasMatch() ? match.captured(1).toLongLong() : 0;
+}
+
+SurplusSessions readSurplus(const IniProfile &profile, int numSessions)
+{
+    SurplusSessions surplus;
+    if (numSessions <= kMaxSessionsRead)
+        return surplus;
+    surplus.count = qint64(numSessions) - kMaxSessionsRead;
+    const QStringList names = profile.sectionNames();
+    for (const QString &name : names) {
+        const qint64 n = sessionNumber(name);
+        if (n > kMaxSessionsRead && n <= numSessions && !surplus.sections.contains(n - kMaxSessionsRead))
+            surplus.sections.insert(n - kMaxSessionsRead, *profile.copySection(name));
+    }
+    return surplus;
+}
+
+// The surplus sessions follow the open ones. A number in their range with no
+// section of its own must not pick up a stale section the file still has.
+void writeSurplus(IniProfile &profile, qint64 openSessions, const SurplusSessions &surplus)
+{
+    const QStringList names = profile.sectionNames();
+    for (const QString &name : names) {
+        const qint64 offset = sessionNumber(name) - openSessions;
+        if (offset >= 1 && offset <= surplus.count && !surplus.sections.contains(offset))
+            profile.removeSection(name);
+    }
+    for (auto it = surplus.sections.cbegin(); it != surplus.sections.cend(); ++it)
+        profile.pasteSection(QStringLiteral("Session%1").arg(openSessions + it.key()), it.value());
+}
+
 bool isAsciiDigit(QChar c)
 {
     return c >= QLatin1Char('0') && c <= QLatin1Char('9');
@@ -158,9 +197,11 @@ Configuration readConfiguration(const IniProfile &profile)
         config.sessions.reserve(sessionCount);
     for (int n = 1; n <= sessionCount; ++n)
         config.sessions.append(readSession(profile, ConfigurationKeys::sessionSection(n)));
+    config.surplus = readSurplus(profile, config.NumSessions);
 
     config.ports = readPorts(profile);
-    config.virtualPortFolder = profile.readString(g, QStringLiteral("VirtualPortFolder"), QString());
+    config.devices.portsSection = profile.copySection(kPortsSection);
+    config.devices.virtualPortFolder = profile.readString(g, QStringLiteral("VirtualPortFolder"), QString());
     return config;
 }
 
@@ -176,7 +217,8 @@ void writeConfiguration(IniProfile &profile, const Configuration &config, bool w
     }
 
     const GlobalOptions &o = config.options;
-    profile.writeInt(g, QStringLiteral("NumSessions"), int(config.sessions.size()));
+    const qint64 sessionCount = config.sessions.size() + config.surplus.count;
+    profile.writeInt(g, QStringLiteral("NumSessions"), int(std::min<qint64>(sessionCount, INT_MAX)));
     profile.writeInt(g, QStringLiteral("WindowState"), p.windowState);
     profile.writeString(g, QStringLiteral("OnErrorRunApp"), o.OnErrorRunApp);
     profile.writeInt(g, QStringLiteral("LogErrors"), o.LogErrors);
@@ -189,6 +231,15 @@ void writeConfiguration(IniProfile &profile, const Configuration &config, bool w
 
     for (qsizetype i = 0; i < config.sessions.size(); ++i)
         writeSession(profile, ConfigurationKeys::sessionSection(int(i + 1)), config.sessions[i]);
+    writeSurplus(profile, config.sessions.size(), config.surplus);
+
+    if (config.writeDevices) {
+        profile.pasteSection(kPortsSection, config.devices.portsSection);
+        if (config.devices.virtualPortFolder.isEmpty())
+            profile.removeKey(g, QStringLiteral("VirtualPortFolder"));
+        else
+            profile.writeString(g, QStringLiteral("VirtualPortFolder"), config.devices.virtualPortFolder);
+    }
 }
 
 QString numericText(const QString &text)

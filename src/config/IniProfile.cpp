@@ -1,5 +1,6 @@
 #include "IniProfile.h"
 
+#include "LegacyText.h"
 #include "platform/FileReplace.h"
 
 #include <QFile>
@@ -10,7 +11,7 @@
 
 namespace {
 
-constexpr QChar kByteOrderMark(0xFEFF);
+constexpr QByteArrayView kUtf8ByteOrderMark("\xEF\xBB\xBF");
 
 QString folded(const QString &name)
 {
@@ -129,35 +130,62 @@ IniProfile IniProfile::load(const QString &path, QString *error)
             *error = QStringLiteral("Cannot read %1: %2").arg(path, file.errorString());
         return IniProfile();
     }
-    return fromText(QString::fromUtf8(bytes));
+    return fromBytes(bytes);
 }
 
-IniProfile IniProfile::fromText(const QString &text)
+IniProfile IniProfile::fromBytes(const QByteArray &bytes)
 {
     IniProfile profile;
-    QStringView rest(text);
-    if (rest.startsWith(kByteOrderMark)) {
+    QByteArrayView rest(bytes);
+    if (rest.startsWith(kUtf8ByteOrderMark)) {
         profile.m_byteOrderMark = true;
-        rest = rest.mid(1);
+        rest = rest.sliced(kUtf8ByteOrderMark.size());
     }
+    bool firstLineEnd = true;
     while (!rest.isEmpty()) {
-        const qsizetype end = rest.indexOf(QLatin1Char('\n'));
-        QStringView line = end < 0 ? rest : rest.left(end);
-        rest = end < 0 ? QStringView() : rest.mid(end + 1);
-        if (line.endsWith(QLatin1Char('\r')))
+        const qsizetype end = rest.indexOf('\n');
+        QByteArrayView line = end < 0 ? rest : rest.first(end);
+        rest = end < 0 ? QByteArrayView() : rest.sliced(end + 1);
+        const bool carriageReturn = line.endsWith('\r');
+        if (carriageReturn)
             line.chop(1);
-        profile.appendParsedLine(line.toString());
+        if (end >= 0 && firstLineEnd) {
+            profile.m_lineFeedOnly = !carriageReturn;
+            firstLineEnd = false;
+        }
+        const QByteArray raw = line.toByteArray();
+        bool legacy = false;
+        QString text = decodeConfigurationBytes(raw, &legacy);
+        // A last line without an end gets the file's usual one.
+        const bool lineFeedOnly = end >= 0 ? !carriageReturn : profile.m_lineFeedOnly;
+        profile.appendParsedLine(std::move(text), legacy ? raw : QByteArray(), lineFeedOnly);
     }
     return profile;
 }
 
-void IniProfile::appendParsedLine(QString text)
+IniProfile IniProfile::fromText(const QString &text)
+{
+    return fromBytes(text.toUtf8());
+}
+
+IniProfile::Line IniProfile::newLine(QString text) const
+{
+    Line line;
+    line.equalsAt = keyEquals(text);
+    line.text = std::move(text);
+    line.lineFeedOnly = m_lineFeedOnly;
+    return line;
+}
+
+void IniProfile::appendParsedLine(QString text, QByteArray legacyBytes, bool lineFeedOnly)
 {
     const QStringView trimmed = QStringView(text).trimmed();
     const QString name = headerName(trimmed);
     if (!name.isNull()) {
         Section section;
         section.header = std::move(text);
+        section.headerLegacyBytes = std::move(legacyBytes);
+        section.headerLineFeedOnly = lineFeedOnly;
         // A repeated section name stays reachable only through its first section.
         const QString key = folded(name);
         if (!m_sectionIndex.contains(key))
@@ -169,6 +197,8 @@ void IniProfile::appendParsedLine(QString text)
     Line line;
     line.equalsAt = keyEquals(text);
     line.text = std::move(text);
+    line.legacyBytes = std::move(legacyBytes);
+    line.lineFeedOnly = lineFeedOnly;
     if (line.equalsAt >= 0) {
         const QString key = folded(line.text.left(line.equalsAt));
         if (!section.keyIndex.contains(key))
@@ -178,37 +208,46 @@ void IniProfile::appendParsedLine(QString text)
     section.lines.append(std::move(line));
 }
 
-QString IniProfile::toText() const
+template<typename Visit>
+void IniProfile::forEachLine(Visit visit) const
 {
-    qsizetype length = 1;
-    for (const Section &section : m_sections) {
-        length += section.header.size() + 2;
-        for (const Line &line : section.lines)
-            length += line.text.size() + 2;
-    }
-    QString text;
-    text.reserve(length);
-    if (m_byteOrderMark)
-        text += kByteOrderMark;
-    const QLatin1String lineEnd("\r\n");
     for (qsizetype i = 0; i < m_sections.size(); ++i) {
         const Section &section = m_sections[i];
-        if (i > 0) {
-            text += section.header;
-            text += lineEnd;
-        }
-        for (const Line &line : section.lines) {
-            text += line.text;
-            text += lineEnd;
-        }
+        if (i > 0)
+            visit(section.header, section.headerLegacyBytes, section.headerLineFeedOnly);
+        for (const Line &line : section.lines)
+            visit(line.text, line.legacyBytes, line.lineFeedOnly);
     }
+}
+
+QString IniProfile::toText() const
+{
+    QString text;
+    if (m_byteOrderMark)
+        text += QChar(0xFEFF);
+    forEachLine([&](const QString &line, const QByteArray &, bool lineFeedOnly) {
+        text += line;
+        text += lineFeedOnly ? QLatin1String("\n") : QLatin1String("\r\n");
+    });
     return text;
+}
+
+QByteArray IniProfile::toBytes() const
+{
+    QByteArray bytes;
+    if (m_byteOrderMark)
+        bytes += kUtf8ByteOrderMark;
+    forEachLine([&](const QString &line, const QByteArray &legacyBytes, bool lineFeedOnly) {
+        bytes += legacyBytes.isEmpty() ? line.toUtf8() : legacyBytes;
+        bytes += lineFeedOnly ? QByteArrayView("\n") : QByteArrayView("\r\n");
+    });
+    return bytes;
 }
 
 bool IniProfile::save(const QString &path, QString *error) const
 {
-    // Mode 0600: the file holds a password.
-    return replaceFileAtomically(path, toText().toUtf8(), error, 0600);
+    // A new file gets mode 0600: it holds a password.
+    return replaceFileAtomically(path, toBytes(), error, 0600);
 }
 
 const IniProfile::Line *IniProfile::findKey(const QString &section, const QString &key) const
@@ -246,6 +285,26 @@ QString IniProfile::readString(const QString &section, const QString &key,
     return cutText(line ? valueOf(*line) : defaultValue);
 }
 
+qsizetype IniProfile::sectionIndexFor(const QString &sectionName)
+{
+    const QString sectionKey = folded(sectionName);
+    const auto sectionAt = m_sectionIndex.constFind(sectionKey);
+    if (sectionAt != m_sectionIndex.cend())
+        return *sectionAt;
+    // Keep a blank line between the last section and the new one.
+    Section &last = m_sections.last();
+    const bool fileEmpty = m_sections.size() == 1 && last.lines.isEmpty();
+    const bool endsBlank = !last.lines.isEmpty() && last.lines.last().text.trimmed().isEmpty();
+    if (!fileEmpty && !endsBlank)
+        last.lines.append(newLine(QString()));
+    Section created;
+    created.header = QLatin1Char('[') + sectionName.trimmed() + QLatin1Char(']');
+    created.headerLineFeedOnly = m_lineFeedOnly;
+    m_sectionIndex.insert(sectionKey, m_sections.size());
+    m_sections.append(std::move(created));
+    return m_sections.size() - 1;
+}
+
 void IniProfile::writeString(const QString &section, const QString &key, const QString &value)
 {
     const QString sectionName = section.trimmed();
@@ -253,39 +312,28 @@ void IniProfile::writeString(const QString &section, const QString &key, const Q
     // A line "=value" would not read back as a key.
     if (keyName.isEmpty())
         return;
-    const QString sectionKey = folded(sectionName);
-    auto sectionAt = m_sectionIndex.constFind(sectionKey);
-    if (sectionAt == m_sectionIndex.cend()) {
-        // Keep a blank line between the last section and the new one.
-        Section &last = m_sections.last();
-        const bool fileEmpty = m_sections.size() == 1 && last.lines.isEmpty();
-        const bool endsBlank = !last.lines.isEmpty() && last.lines.last().text.trimmed().isEmpty();
-        if (!fileEmpty && !endsBlank)
-            last.lines.append(Line());
-        Section created;
-        created.header = QLatin1Char('[') + sectionName + QLatin1Char(']');
-        sectionAt = m_sectionIndex.insert(sectionKey, m_sections.size());
-        m_sections.append(std::move(created));
-    }
-    Section &target = m_sections[*sectionAt];
+    Section &target = m_sections[sectionIndexFor(sectionName)];
     const QString text = singleLine(value);
     const QString lineKey = folded(keyName);
     const auto lineAt = target.keyIndex.constFind(lineKey);
     if (lineAt != target.keyIndex.cend()) {
         Line &line = target.lines[*lineAt];
+        // The same value keeps the line as it stands, bytes and spelling.
+        if (valueOf(line) == text.trimmed())
+            return;
         const QString spelled = QStringView(line.text).left(line.equalsAt).trimmed().toString();
         line.text = spelled + QLatin1Char('=') + text;
         line.equalsAt = spelled.size();
+        // A line in the legacy code page stays in it where it can.
+        if (!line.legacyBytes.isEmpty())
+            line.legacyBytes = encodeLegacy(line.text);
         return;
     }
     // After the last key, so comments and blank lines that close the section
     // stay in front of the next header. No key line follows this position,
     // so the key index stays valid.
     const qsizetype at = target.lastKeyLine + 1;
-    Line line;
-    line.text = keyName + QLatin1Char('=') + text;
-    line.equalsAt = keyName.size();
-    target.lines.insert(at, std::move(line));
+    target.lines.insert(at, newLine(keyName + QLatin1Char('=') + text));
     target.keyIndex.insert(lineKey, at);
     target.lastKeyLine = at;
 }
@@ -293,6 +341,91 @@ void IniProfile::writeString(const QString &section, const QString &key, const Q
 void IniProfile::writeInt(const QString &section, const QString &key, int value)
 {
     writeString(section, key, QString::number(value));
+}
+
+void IniProfile::removeKey(const QString &section, const QString &key)
+{
+    const auto sectionAt = m_sectionIndex.constFind(folded(section));
+    if (sectionAt == m_sectionIndex.cend())
+        return;
+    Section &found = m_sections[*sectionAt];
+    const QString name = folded(key);
+    const auto before = found.lines.size();
+    found.lines.removeIf([&](const Line &line) {
+        return line.equalsAt >= 0 && folded(line.text.left(line.equalsAt)) == name;
+    });
+    if (found.lines.size() != before)
+        reindex();
+}
+
+std::optional<IniProfile::SectionCopy> IniProfile::copySection(const QString &section) const
+{
+    const auto sectionAt = m_sectionIndex.constFind(folded(section));
+    if (sectionAt == m_sectionIndex.cend())
+        return std::nullopt;
+    return SectionCopy { m_sections[*sectionAt].lines };
+}
+
+void IniProfile::pasteSection(const QString &section, const std::optional<SectionCopy> &copy)
+{
+    if (!copy) {
+        removeSection(section);
+        return;
+    }
+    Section &target = m_sections[sectionIndexFor(section)];
+    target.lines = copy->lines;
+    indexKeys(target);
+}
+
+void IniProfile::removeSection(const QString &section)
+{
+    const QString name = folded(section);
+    const auto before = m_sections.size();
+    // Every section of that name goes, repeated ones too: none may be read
+    // in place of the one removed.
+    for (qsizetype i = m_sections.size() - 1; i > 0; --i) {
+        if (folded(headerName(QStringView(m_sections[i].header).trimmed())) == name)
+            m_sections.removeAt(i);
+    }
+    if (m_sections.size() != before)
+        reindex();
+}
+
+QStringList IniProfile::sectionNames() const
+{
+    QStringList names;
+    for (qsizetype i = 1; i < m_sections.size(); ++i)
+        names << headerName(QStringView(m_sections[i].header).trimmed());
+    return names;
+}
+
+void IniProfile::reindex()
+{
+    m_sectionIndex.clear();
+    for (qsizetype i = 0; i < m_sections.size(); ++i) {
+        Section &section = m_sections[i];
+        if (i > 0) {
+            const QString key = folded(headerName(QStringView(section.header).trimmed()));
+            if (!m_sectionIndex.contains(key))
+                m_sectionIndex.insert(key, i);
+        }
+        indexKeys(section);
+    }
+}
+
+void IniProfile::indexKeys(Section &section)
+{
+    section.keyIndex.clear();
+    section.lastKeyLine = -1;
+    for (qsizetype at = 0; at < section.lines.size(); ++at) {
+        const Line &line = section.lines[at];
+        if (line.equalsAt < 0)
+            continue;
+        const QString key = folded(line.text.left(line.equalsAt));
+        if (!section.keyIndex.contains(key))
+            section.keyIndex.insert(key, at);
+        section.lastKeyLine = at;
+    }
 }
 
 bool IniProfile::hasSection(const QString &section) const

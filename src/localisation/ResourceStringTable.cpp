@@ -211,6 +211,13 @@ constexpr std::array kTable = std::to_array<ResourceStringEntry>({
     { 5122, "Enter the IP Address of the computer that you want to ping.", "Ping を送信するコンピューターの IP アドレスを入力してください。" },
     { 5123, "Enter the data string that you want to ping the computer with.", "Ping でコンピューターに送信するデータ文字列を入力してください。" },
     { 5124, "Enter the Workstation Name or the URL for the computer that you want to find the IP Address of", "IP アドレスを調べたいコンピューターのワークステーション名または URL を入力してください" },
+
+    // Configuration files: messages that name the file and the cause after them
+    { 5201, "The configuration file cannot be loaded:", "構成ファイルを読み込めません:" },
+    { 5202, "Velloca starts with a new configuration and does not save it when it ends.", "Velloca は新しい構成で起動し、終了時に保存しません。" },
+    { 5203, "Another copy of Velloca is using this configuration file; this copy does not save it when it ends:", "別の Velloca がこの構成ファイルを使用中です。このコピーは終了時に保存しません:" },
+    { 5204, "The configuration was not saved:", "構成は保存されませんでした:" },
+    { 5205, "Velloca opens at most 256 sessions. Close a session before you add another.", "Velloca が開けるセッションは 256 までです。追加する前にセッションを閉じてください。" },
 });
 
 constexpr bool strictlyAscending()

@@ -110,6 +110,19 @@ bool replaceFileAtomically(const QString &path, const QByteArray &data, QString 
     // A link stays a link: the file it names is the one replaced.
     const QString resolved = resolvedTarget(path);
     const QFileInfo target(resolved);
+    struct stat existing {};
+    const bool exists = ::stat(QFile::encodeName(resolved).constData(), &existing) == 0;
+    // Renaming over a device or a FIFO would take its place in the folder.
+    if (exists && !S_ISREG(existing.st_mode)) {
+        setError(error, QStringLiteral("Cannot write %1: not a regular file").arg(resolved));
+        return false;
+    }
+    // Someone made the file read-only on purpose; root could replace it
+    // anyway, so the mode is checked rather than left to the kernel.
+    if (exists && (existing.st_mode & 0222) == 0) {
+        setError(error, QStringLiteral("Cannot write %1: the file is read-only").arg(resolved));
+        return false;
+    }
     // Hidden, so a folder listing during the write does not show it.
     QByteArray temporary = QFile::encodeName(
         target.absolutePath() + QStringLiteral("/.") + target.fileName() + QStringLiteral(".XXXXXX"));
@@ -119,8 +132,16 @@ bool replaceFileAtomically(const QString &path, const QByteArray &data, QString 
                             .arg(resolved, target.absolutePath(), systemError(errno)));
         return false;
     }
+    // An existing file keeps its owner, group and mode, so that a run as
+    // root does not take a user's file away from them. Only root may give a
+    // file away; anyone may try their own groups.
+    if (exists && ::fchown(fd, existing.st_uid, existing.st_gid) != 0
+        && ::fchown(fd, uid_t(-1), existing.st_gid) != 0) {
+        // Not ours to give away: the file becomes this user's, like a new one.
+    }
+    const mode_t newMode = exists ? mode_t(existing.st_mode & 07777) : mode;
     // The mode is set explicitly in case the umask or an ACL widened it.
-    const bool written = ::fchmod(fd, mode) == 0 && writeAll(fd, data) && ::fsync(fd) == 0;
+    const bool written = ::fchmod(fd, newMode) == 0 && writeAll(fd, data) && ::fsync(fd) == 0;
     const int writeError = errno;
     const bool closed = ::close(fd) == 0;
     const int closeError = errno;

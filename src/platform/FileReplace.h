@@ -13,8 +13,11 @@
 bool makeFolderPath(const QString &folder, QString *error);
 
 // Replaces path with data through a temporary file in the same folder
-// (synced, then renamed over path), mode 0644. On failure the old file is
-// untouched and no temporary file is left.
+// (synced, then renamed over path). A new file gets mode; an existing one
+// keeps its mode, owner and group. Through a symbolic link the link stays
+// and the file it names is replaced. Refused, with the old file untouched:
+// a target that is not a regular file, and a file without any write bit
+// (also for root). On failure no temporary file is left.
 bool replaceFileAtomically(const QString &path, const QByteArray &data, QString *error, mode_t mode = 0644);
 
 // Removes path; a missing file (or folder on the way) counts as removed.

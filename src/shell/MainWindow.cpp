@@ -9,7 +9,9 @@
 #include "dialogs/PasswordDialogs.h"
 #include "localisation/ApplyResourceStrings.h"
 #include "localisation/ResourceStrings.h"
+#include "config/ConfigurationFile.h"
 #include "platform/CommandChannel.h"
+#include "platform/FileLock.h"
 #include "platform/ServiceNotifier.h"
 #include "platform/ServiceSwitch.h"
 #include "platform/VirtualPortFolder.h"
@@ -20,6 +22,7 @@
 #include <QApplication>
 #include <QCloseEvent>
 #include <QDir>
+#include <QFileInfo>
 #include <QGuiApplication>
 #include <QLockFile>
 #include <QRegularExpression>
@@ -116,7 +119,8 @@ SessionWindow *MainWindow::sessionForTopic(const QString &topic) const
 
 void MainWindow::StartUpSequence()
 {
-    QDir::setCurrent(programFolder());
+    // The working folder is never changed: a relative file name on the
+    // command line means the folder the program was started in.
     ApplyResourceStrings(this);
     m_timer1.stop();
     m_autoActivateList = { 0, 0 };
@@ -125,15 +129,86 @@ void MainWindow::StartUpSequence()
     if (!m_commandLine.isEmpty()) {
         if (handleServiceSwitch(m_commandLine))
             return;
-        configFile = m_commandLine;
+        configFile = QFileInfo(m_commandLine).absoluteFilePath();
     }
     addTrayIcon();
-    getprofilesettings(configFile);
+    if (!loadStartUpConfiguration(configFile))
+        return;
+    takeConfigurationLock();
     openCommandChannel();
     resetBusInFirstCopy();
     autoActivate();
     m_startUpDone = true;
     notifyServiceReady();
+}
+
+bool MainWindow::loadStartUpConfiguration(const QString &namedFile)
+{
+    QString error;
+    if (!namedFile.isEmpty()) {
+        if (getprofilesettings(namedFile, &error)) {
+            m_exitSaveAllowed = true;
+            return true;
+        }
+        if (!reportLoadFailure(error))
+            return false;
+    }
+    if (getprofilesettings(QString(), &error)) {
+        m_exitSaveAllowed = true;
+        return true;
+    }
+    if (!reportLoadFailure(error))
+        return false;
+    // Nothing could be loaded: the user gets a new session, and the file
+    // that failed is never overwritten.
+    tellUser(LoadResString(5202), false);
+    NewSessionWindow();
+    return true;
+}
+
+// Headless nobody could answer for the lost file: the program ends before it
+// writes anything. With a display the user is told and the program goes on.
+bool MainWindow::reportLoadFailure(const QString &error)
+{
+    if (isHeadless()) {
+        QTextStream(stderr) << "velloca: " << LoadResString(5201) << ' ' << error << '\n';
+        Q_EMIT finishedEarly(2);
+        return false;
+    }
+    tellUser(LoadResString(5201) + u'\n' + error, true);
+    return true;
+}
+
+void MainWindow::takeConfigurationLock()
+{
+    const QString path = defaultConfigurationPath();
+    bool busy = false;
+    QString error;
+    m_configurationLock = FileLock::tryLock(path + QStringLiteral(".lock"), &busy, &error);
+    if (m_configurationLock)
+        return;
+    // Two copies saving one file at exit would leave only the last one's
+    // sessions; this copy runs but leaves the file to the other one.
+    m_exitSaveAllowed = false;
+    if (busy)
+        tellUser(LoadResString(5203) + u'\n' + path, false);
+    else
+        qWarning("velloca: %s", qPrintable(error));
+}
+
+void MainWindow::tellUser(const QString &text, bool critical)
+{
+    if (isHeadless()) {
+        QTextStream(stderr) << "velloca: " << text << '\n';
+        return;
+    }
+    UserDialogs::showMessage({ this, text, QStringLiteral("Velloca"),
+                               critical ? UserDialogs::Icon::Critical : UserDialogs::Icon::Warning });
+}
+
+bool MainWindow::isHeadless() const
+{
+    return QGuiApplication::platformName() == QStringLiteral("offscreen");
 }
 
 void MainWindow::openCommandChannel()
@@ -156,7 +231,7 @@ bool MainWindow::handleServiceSwitch(const QString &commandLine)
         if (!result.detail.isEmpty())
             text += u'\n' + result.detail;
         // Without a display nobody would see a box: the terminal gets it.
-        if (QGuiApplication::platformName() == QStringLiteral("offscreen"))
+        if (isHeadless())
             QTextStream(stderr) << text << '\n';
         else
             UserDialogs::showMessage({ this, text, QStringLiteral("Velloca"),
@@ -248,7 +323,7 @@ void MainWindow::shutdown()
     m_timer1.stop();
     // Before the configuration was loaded there is nothing to save, and
     // saving would overwrite the file with an empty one.
-    if (m_startUpDone)
+    if (m_startUpDone && m_exitSaveAllowed)
         writeprofilesettings(QString());
     if (m_trayIcon)
         m_trayIcon->hide();

@@ -13,6 +13,7 @@
 #include <optional>
 
 class CommandChannel;
+class FileLock;
 class QLockFile;
 class QMdiSubWindow;
 class QMenu;
@@ -32,8 +33,12 @@ public:
     ~MainWindow() override;
 
     // Load / save a configuration; an empty name means the default file.
-    void getprofilesettings(const QString &fileName);
-    void writeprofilesettings(const QString &fileName);
+    // False, with nothing changed, when the file cannot be loaded; error
+    // then names the file and the cause. A named file must exist; a missing
+    // default file loads as empty.
+    bool getprofilesettings(const QString &fileName, QString *error = nullptr);
+    // False, after telling the user, when the file could not be written.
+    bool writeprofilesettings(const QString &fileName);
     SessionWindow *NewSessionWindow();
     // Session windows in creation order (session 1, 2, ...).
     QList<SessionWindow *> sessionWindows() const;
@@ -84,6 +89,12 @@ private:
     void addTrayIcon();
     void openCommandChannel();
     void resetBusInFirstCopy();
+    bool loadStartUpConfiguration(const QString &namedFile);
+    bool reportLoadFailure(const QString &error);
+    void takeConfigurationLock();
+    void tellUser(const QString &text, bool critical);
+    void reportSaveFailure(const QString &error);
+    bool isHeadless() const;
     void autoActivate();
     void handleWindowStateChange();
     void restoreCheck();
@@ -101,11 +112,17 @@ private:
     QList<QPointer<SessionWindow>> m_sessions;
     QList<int> m_autoActivateList;
     QString m_currentConfigFile;
-    QString m_virtualPortFolder;
     QSystemTrayIcon *m_trayIcon = nullptr;
     QMenu *m_trayMenu = nullptr;
     CommandChannel *m_commandChannel = nullptr;
     std::unique_ptr<QLockFile> m_instanceLock;
+    std::unique_ptr<FileLock> m_configurationLock;
+    QString m_loadedConfigPath; // the file the sessions came from
+    DeviceSettings m_loadedDevices;
+    SurplusSessions m_surplusSessions;
+    // Only a run whose configuration was loaded, and that holds the lock on
+    // the default file, writes it at exit.
+    bool m_exitSaveAllowed = false;
     bool m_startUpDone = false;
     bool m_exitRequested = false;
     bool m_resizeBusy = false;

@@ -105,6 +105,10 @@ void MainWindow::rebuildWindowMenu()
 
 void MainWindow::mnuFileNew_Click()
 {
+    if (sessionWindows().size() >= kMaxSessionsRead) {
+        UserDialogs::showMessage({ this, LoadResString(5205), QStringLiteral("Velloca"), UserDialogs::Icon::Warning });
+        return;
+    }
     NewSessionWindow();
 }
 
@@ -113,8 +117,15 @@ void MainWindow::mnuFileOpen_Click()
     const auto file = UserDialogs::askFileName({ this, QString(), kFileFilter, QString(), false });
     if (!file)
         return;
+    QString error;
+    if (!getprofilesettings(*file, &error)) {
+        UserDialogs::showMessage({ this, LoadResString(5201) + u'\n' + error, QStringLiteral("Velloca"),
+                                   UserDialogs::Icon::Critical });
+        return;
+    }
     m_currentConfigFile = *file;
-    getprofilesettings(m_currentConfigFile);
+    // The file that is open now is the one whose sessions an exit saves.
+    m_exitSaveAllowed = m_configurationLock != nullptr;
 }
 
 void MainWindow::mnuFileClose_Click()

@@ -11,11 +11,15 @@
 #include "platform/AutostartEntry.h"
 #include "platform/PortMap.h"
 #include "platform/VirtualPortFolder.h"
+#include "session/ErrorLog.h"
 #include "session/SessionEngine.h"
 #include "session/SessionWindow.h"
+#include "session/UserDialogs.h"
 
 #include <QCoreApplication>
+#include <QFileInfo>
 #include <QMdiSubWindow>
+#include <QTextStream>
 
 #include <cmath>
 
@@ -29,7 +33,8 @@ enum WindowStateValue { StateNormal = 0, StateMinimized = 1, StateMaximized = 2 
 
 QString MainWindow::virtualPortFolder() const
 {
-    return m_virtualPortFolder.isEmpty() ? defaultVirtualPortFolder() : m_virtualPortFolder;
+    const QString &folder = m_loadedDevices.virtualPortFolder;
+    return folder.isEmpty() ? defaultVirtualPortFolder() : folder;
 }
 
 SessionWindow *MainWindow::NewSessionWindow()
@@ -66,11 +71,23 @@ void MainWindow::closeAllSessionWindows()
     m_ui->mnuFileClose->setEnabled(false);
 }
 
-void MainWindow::getprofilesettings(const QString &fileName)
+bool MainWindow::getprofilesettings(const QString &fileName, QString *error)
 {
     const QString path = fileName.isEmpty() ? defaultConfigurationPath() : fileName;
+    QString loadError;
+    const IniProfile profile = IniProfile::load(path, &loadError);
+    if (loadError.isEmpty() && !fileName.isEmpty() && !QFileInfo::exists(path))
+        loadError = QStringLiteral("Cannot read %1: no such file").arg(path);
+    if (!loadError.isEmpty()) {
+        if (error)
+            *error = loadError;
+        return false;
+    }
     closeAllSessionWindows();
-    const Configuration config = readConfiguration(IniProfile::load(path));
+    const Configuration config = readConfiguration(profile);
+    m_loadedConfigPath = path;
+    m_loadedDevices = config.devices;
+    m_surplusSessions = config.surplus;
 
     const double dpi = logicalDpiX() > 0 ? logicalDpiX() : 96.0;
     auto pixels = [dpi](int twips) { return int(std::lround(twips * dpi / kTwipsPerInch)); };
@@ -87,11 +104,10 @@ void MainWindow::getprofilesettings(const QString &fileName)
     PortMap::global().clear();
     for (auto it = config.ports.cbegin(); it != config.ports.cend(); ++it)
         PortMap::global().setDevice(it.key(), it.value());
-    m_virtualPortFolder = config.virtualPortFolder;
 
     if (config.NumSessions == 0) {
         NewSessionWindow();
-        return;
+        return true;
     }
     m_autoActivateList = QList<int>(qMax(0, int(config.sessions.size())) + 2, 0);
     for (int n = 1; n <= config.sessions.size(); ++n) {
@@ -100,12 +116,19 @@ void MainWindow::getprofilesettings(const QString &fileName)
         if (session.AutoActivate == 1)
             m_autoActivateList[n] = 1;
     }
+    return true;
 }
 
-void MainWindow::writeprofilesettings(const QString &fileName)
+bool MainWindow::writeprofilesettings(const QString &fileName)
 {
     const QString path = fileName.isEmpty() ? defaultConfigurationPath() : fileName;
-    IniProfile profile = IniProfile::load(path);
+    QString error;
+    IniProfile profile = IniProfile::load(path, &error);
+    // What cannot be read cannot be kept: saving would drop its lines.
+    if (!error.isEmpty()) {
+        reportSaveFailure(error);
+        return false;
+    }
     Configuration config;
     const double dpi = logicalDpiX() > 0 ? logicalDpiX() : 96.0;
     auto twips = [dpi](int pixels) { return int(std::lround(pixels * kTwipsPerInch / dpi)); };
@@ -118,12 +141,29 @@ void MainWindow::writeprofilesettings(const QString &fileName)
     config.options = GlobalOptions::global();
     for (SessionWindow *window : sessionWindows())
         config.sessions << window->currentConfiguration();
+    config.surplus = m_surplusSessions;
+    config.devices = m_loadedDevices;
+    config.writeDevices = QFileInfo(path).absoluteFilePath() != QFileInfo(m_loadedConfigPath).absoluteFilePath();
     writeConfiguration(profile, config, !isMinimized());
-    QString error;
     if (!SetAutoStart(GlobalOptions::global().LoadWithWindows == 1, QCoreApplication::applicationFilePath(), &error))
         qWarning("velloca: autostart entry not changed: %s", qPrintable(error));
-    if (!profile.save(path, &error))
-        qWarning("velloca: configuration not saved: %s", qPrintable(error));
+    if (!profile.save(path, &error)) {
+        reportSaveFailure(error);
+        return false;
+    }
+    return true;
+}
+
+void MainWindow::reportSaveFailure(const QString &error)
+{
+    const QString text = LoadResString(5204) + u' ' + error;
+    writeErrorLogLine(ErrorLogContext(), text, GlobalOptions::global());
+    // A box at exit would hold up a logout or a service stop; any other save
+    // was asked for from a menu.
+    if (m_shutDown)
+        QTextStream(stderr) << "velloca: " << text << '\n';
+    else
+        UserDialogs::showMessage({ this, text, QStringLiteral("Velloca"), UserDialogs::Icon::Critical });
 }
 
 QList<SessionWindow *> MainWindow::sessionWindows() const

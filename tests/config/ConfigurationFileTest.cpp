@@ -188,7 +188,7 @@ TEST(ConfigurationFile, MissingFileGivesLoadDefaults)
     EXPECT_EQ(config.options.PacketSize, 2000);
     EXPECT_EQ(config.options.LoadWithWindows, 0);
     EXPECT_TRUE(config.ports.isEmpty());
-    EXPECT_EQ(config.virtualPortFolder, QString());
+    EXPECT_EQ(config.devices.virtualPortFolder, QString());
 }
 
 TEST(ConfigurationFile, HandWrittenFileReadsWithAnyCaseAndMissingSections)
@@ -230,7 +230,7 @@ TEST(ConfigurationFile, HandWrittenFileReadsWithAnyCaseAndMissingSections)
     for (int i = 1; i < 3; ++i)
         EXPECT_EQ(describe(config.sessions[i]), describe(loadDefaults())) << "session " << i + 1;
 
-    EXPECT_EQ(config.virtualPortFolder, QStringLiteral("/run/user/1000/ports"));
+    EXPECT_EQ(config.devices.virtualPortFolder, QStringLiteral("/run/user/1000/ports"));
     QHash<int, QString> ports;
     ports.insert(5, QStringLiteral("/dev/ttyUSB0"));
     ports.insert(1, QStringLiteral("/dev/serial/by-id/usb-FTDI-if00"));
@@ -245,7 +245,7 @@ TEST(ConfigurationFile, HandWrittenFileReadsWithAnyCaseAndMissingSections)
               QStringLiteral("1"));
     EXPECT_EQ(profile.readString(QStringLiteral("Ports"), QStringLiteral("COM5"), QString()),
               QStringLiteral("/dev/ttyUSB0"));
-    EXPECT_EQ(loadFile(path).virtualPortFolder, QStringLiteral("/run/user/1000/ports"));
+    EXPECT_EQ(loadFile(path).devices.virtualPortFolder, QStringLiteral("/run/user/1000/ports"));
     EXPECT_EQ(loadFile(path).ports, ports);
 }
 
@@ -352,7 +352,8 @@ TEST(ConfigurationFile, BadValuesStayBounded)
     EXPECT_EQ(config.sessions[0].settings.Connector, -1);
     EXPECT_EQ(config.options.PacketSize, -5);
 
-    // Ten thousand real sections: read up to the cap, saved back without loss.
+    // Ten thousand real sections: read up to the cap, the rest kept and
+    // numbered on behind the open sessions when one of those is closed.
     QByteArray many = "[Velloca]\r\nNumSessions=10000\r\n";
     for (int n = 1; n <= 10000; ++n)
         many += "[Session" + QByteArray::number(n) + "]\r\nPortNumber=" + QByteArray::number(n) + "\r\n";
@@ -360,10 +361,15 @@ TEST(ConfigurationFile, BadValuesStayBounded)
     config = loadFile(path);
     ASSERT_EQ(config.sessions.size(), kMaxSessionsRead);
     EXPECT_EQ(config.sessions.last().settings.PortNumber, QString::number(kMaxSessionsRead));
+    config.sessions.removeFirst();
     saveFile(path, config);
     const IniProfile profile = IniProfile::load(path);
-    EXPECT_EQ(profile.readInt(kGlobal, QStringLiteral("NumSessions"), 0), kMaxSessionsRead);
-    EXPECT_EQ(profile.readString(QStringLiteral("Session10000"), QStringLiteral("PortNumber"), QString()),
-              QStringLiteral("10000"));
+    EXPECT_EQ(profile.readInt(kGlobal, QStringLiteral("NumSessions"), 0), 9999);
+    auto port = [&](int session) {
+        return profile.readString(QStringLiteral("Session%1").arg(session), QStringLiteral("PortNumber"), QString());
+    };
+    EXPECT_EQ(port(1), QStringLiteral("2"));
+    EXPECT_EQ(port(256), QStringLiteral("257"));
+    EXPECT_EQ(port(9999), QStringLiteral("10000"));
     EXPECT_LT(timer.elapsed(), 30000);
 }

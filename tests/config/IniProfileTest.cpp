@@ -3,6 +3,7 @@
 #include <QDir>
 #include <QElapsedTimer>
 #include <QFile>
+#include <QFileInfo>
 #include <QRandomGenerator>
 #include <QTemporaryDir>
 
@@ -158,27 +159,28 @@ TEST(IniProfile, SaveKeepsCommentsUnknownSectionsAndOrder)
     QString error;
     ASSERT_TRUE(profile.save(path, &error)) << qPrintable(error);
 
+    // The file's own line ends (LF here) are kept.
     EXPECT_EQ(readFile(path),
-              QByteArray("; written by hand\r\n"
-                         "stray line before any section\r\n"
-                         "\r\n"
-                         "[Velloca]\r\n"
-                         "numSessions=2\r\n"
-                         "; the password is below\r\n"
-                         "Custom=changed\r\n"
-                         "Custom=second copy\r\n"
-                         "Password=pw\r\n"
-                         "no equals sign here\r\n"
-                         "\r\n"
-                         "; about the next section\r\n"
-                         "[Extra]\r\n"
-                         "Anything = goes\r\n"
-                         "[velloca]\r\n"
-                         "NumSessions=99\r\n"
-                         "\r\n"
-                         "[Session1]\r\n"
-                         "Connector=3\r\n"
-                         "Text=two lines\r\n"));
+              QByteArray("; written by hand\n"
+                         "stray line before any section\n"
+                         "\n"
+                         "[Velloca]\n"
+                         "numSessions=2\n"
+                         "; the password is below\n"
+                         "Custom=changed\n"
+                         "Custom=second copy\n"
+                         "Password=pw\n"
+                         "no equals sign here\n"
+                         "\n"
+                         "; about the next section\n"
+                         "[Extra]\n"
+                         "Anything = goes\n"
+                         "[velloca]\n"
+                         "NumSessions=99\n"
+                         "\n"
+                         "[Session1]\n"
+                         "Connector=3\n"
+                         "Text=two lines\n"));
 
     const IniProfile reloaded = IniProfile::load(path);
     EXPECT_EQ(reloaded.readInt(QStringLiteral("Velloca"), QStringLiteral("NumSessions"), 0), 2)
@@ -195,12 +197,13 @@ TEST(IniProfile, AcceptsLfAndCrLfAndKeepsByteOrderMark)
     for (const IniProfile *profile : { &lf, &crlf }) {
         EXPECT_EQ(profile->readInt(QStringLiteral("A"), QStringLiteral("K"), 0), 1);
         EXPECT_EQ(profile->readInt(QStringLiteral("B"), QStringLiteral("K"), 0), 2);
-        EXPECT_EQ(profile->toText(), QStringLiteral("[A]\r\nK=1\r\n[B]\r\nK=2\r\n"));
     }
+    EXPECT_EQ(lf.toText(), QStringLiteral("[A]\nK=1\n[B]\nK=2\n"));
+    EXPECT_EQ(crlf.toText(), QStringLiteral("[A]\r\nK=1\r\n[B]\r\nK=2\r\n"));
 
     const IniProfile bom = IniProfile::fromText(QStringLiteral("\uFEFF[A]\nK=1\n"));
     EXPECT_EQ(bom.readInt(QStringLiteral("A"), QStringLiteral("K"), 0), 1);
-    EXPECT_EQ(bom.toText(), QStringLiteral("\uFEFF[A]\r\nK=1\r\n"));
+    EXPECT_EQ(bom.toText(), QStringLiteral("\uFEFF[A]\nK=1\n"));
 }
 
 TEST(IniProfile, MissingOrUnreadableFilesLoadEmpty)
@@ -260,7 +263,7 @@ TEST(IniProfile, GarbageLoadsInBoundedTime)
     EXPECT_LT(timer.elapsed(), 20000);
 }
 
-TEST(IniProfile, SaveIsAtomicWithMode0600)
+TEST(IniProfile, SaveIsAtomicKeepsTheModeAndReplacesOnlyWritableRegularFiles)
 {
     QTemporaryDir dir;
     ASSERT_TRUE(dir.isValid());
@@ -276,7 +279,7 @@ TEST(IniProfile, SaveIsAtomicWithMode0600)
     ASSERT_TRUE(QFile::setPermissions(path, QFileDevice::ReadOwner | QFileDevice::WriteOwner
                                                 | QFileDevice::ReadGroup | QFileDevice::ReadOther));
     ASSERT_TRUE(profile.save(path, &error)) << qPrintable(error);
-    EXPECT_EQ(fileMode(path), mode_t(0600)) << "replaced file";
+    EXPECT_EQ(fileMode(path), mode_t(0644)) << "replaced file";
     EXPECT_EQ(readFile(path), QByteArray("[Velloca]\r\nPassword=secret\r\n"));
     EXPECT_EQ(folderEntries(dir.path()), QStringList({ "default.vlk" }));
 
@@ -287,6 +290,48 @@ TEST(IniProfile, SaveIsAtomicWithMode0600)
     ASSERT_TRUE(profile.save(link, &error)) << qPrintable(error);
     EXPECT_TRUE(QFileInfo(link).isSymLink());
     EXPECT_EQ(IniProfile::load(path).readInt(QStringLiteral("Velloca"), QStringLiteral("LogErrors"), 0), 1);
+
+    // Refused, and left as they are: a FIFO behind a link, and a file
+    // without write bits (also for root).
+    const QString fifo = dir.filePath(QStringLiteral("fifo"));
+    ASSERT_EQ(::mkfifo(QFile::encodeName(fifo).constData(), 0600), 0);
+    const QString fifoLink = dir.filePath(QStringLiteral("fifo.vlk"));
+    ASSERT_TRUE(QFile::link(fifo, fifoLink));
+    EXPECT_FALSE(profile.save(fifoLink, &error));
+    EXPECT_TRUE(error.contains(QStringLiteral("not a regular file"))) << qPrintable(error);
+    EXPECT_TRUE(QFileInfo(fifoLink).isSymLink());
+    struct stat fifoInfo {};
+    ASSERT_EQ(::stat(QFile::encodeName(fifo).constData(), &fifoInfo), 0);
+    EXPECT_TRUE(S_ISFIFO(fifoInfo.st_mode));
+    ASSERT_EQ(::chmod(QFile::encodeName(path).constData(), 0444), 0);
+    const QByteArray before = readFile(path);
+    EXPECT_FALSE(profile.save(path, &error));
+    EXPECT_TRUE(error.contains(QStringLiteral("read-only"))) << qPrintable(error);
+    EXPECT_EQ(readFile(path), before);
+    EXPECT_EQ(folderEntries(dir.path()), QStringList({ "default.vlk", "fifo", "fifo.vlk", "link.vlk" }));
+}
+
+TEST(IniProfile, BytesThatAreNotUtf8ShowInTheCodePageAndStayAsTheyWere)
+{
+    const QByteArray savedLocale = qgetenv("LC_ALL");
+    qputenv("LC_ALL", "de_DE.UTF-8");
+    const QByteArray latin1 = "[A]\r\nName=S\xFC" "d\r\nUtf8=S\xC3\xBC" "d\r\n";
+    IniProfile profile = IniProfile::fromBytes(latin1);
+    EXPECT_EQ(profile.readString(QStringLiteral("A"), QStringLiteral("Name"), QString()), QStringLiteral("Süd"));
+    EXPECT_EQ(profile.readString(QStringLiteral("A"), QStringLiteral("Utf8"), QString()), QStringLiteral("Süd"));
+    profile.writeString(QStringLiteral("A"), QStringLiteral("Name"), QStringLiteral("Süd"));
+    EXPECT_EQ(profile.toBytes(), latin1) << "an unchanged value keeps its bytes";
+    profile.writeString(QStringLiteral("A"), QStringLiteral("Name"), QStringLiteral("Nord-Süd"));
+    EXPECT_TRUE(profile.toBytes().contains("Name=Nord-S\xFC" "d\r\n")) << "an edit stays in the code page";
+    profile.writeString(QStringLiteral("A"), QStringLiteral("Name"), QStringLiteral("東"));
+    EXPECT_TRUE(profile.toBytes().contains("Name=\xE6\x9D\xB1\r\n")) << "what the code page cannot hold is UTF-8";
+
+    qputenv("LC_ALL", "ja_JP.UTF-8");
+    const QByteArray shiftJis = "[A]\nName=\x83\x56\x83\x8a\x83\x41\x83\x8b\n";
+    profile = IniProfile::fromBytes(shiftJis);
+    EXPECT_EQ(profile.readString(QStringLiteral("A"), QStringLiteral("Name"), QString()), QStringLiteral("シリアル"));
+    EXPECT_EQ(profile.toBytes(), shiftJis);
+    qputenv("LC_ALL", savedLocale);
 }
 
 TEST(IniProfile, FailedSaveKeepsTheOldFileAndLeavesNothingBehind)

@@ -58,6 +58,12 @@ QString serverSessionSection(int number, int connector, quint16 port, bool autoA
         .arg(autoActivate ? 1 : 0);
 }
 
+QByteArray fileBytes(const QString &path)
+{
+    QFile file(path);
+    return file.open(QIODevice::ReadOnly) ? file.readAll() : QByteArray();
+}
+
 QString iniValue(const QString &text, const QString &section, const QString &key)
 {
     static const QRegularExpression lineBreak(QStringLiteral("\r?\n"));

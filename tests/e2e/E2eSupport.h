@@ -25,6 +25,10 @@ QByteArray allByteValues(int size, int seed = 0);
 // sending serial data as it comes and dropping it while no client is there.
 QString serverSessionSection(int number, int connector, quint16 port, bool autoActivate);
 
+// The whole content of a file; empty when it cannot be read.
+QByteArray fileBytes(const QString &path);
+inline QString fileText(const QString &path) { return QString::fromUtf8(fileBytes(path)); }
+
 // The value of a key in INI text, names matched case-insensitively; a null
 // string when the section or key is missing.
 QString iniValue(const QString &text, const QString &section, const QString &key);

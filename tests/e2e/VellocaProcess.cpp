@@ -11,10 +11,15 @@
 #include <algorithm>
 #include <csignal>
 
-VellocaProcess::VellocaProcess()
+VellocaProcess::VellocaProcess(const VellocaProcess *sameHomeAs)
 {
+    if (sameHomeAs) {
+        m_home = sameHomeAs->rootPath();
+        return;
+    }
     if (!m_root.isValid())
         return;
+    m_home = m_root.path();
     QDir().mkpath(configFolder());
     QDir().mkpath(rootPath() + QStringLiteral("/home"));
     QDir().mkpath(runtimeFolder());
@@ -87,10 +92,18 @@ bool VellocaProcess::start(const QByteArray &defaultConfiguration, const QString
     environment.insert(QStringLiteral("HOME"), rootPath() + QStringLiteral("/home"));
     environment.insert(QStringLiteral("XDG_CONFIG_HOME"), configHome());
     environment.insert(QStringLiteral("XDG_RUNTIME_DIR"), runtimeFolder());
+    environment.insert(m_extraEnvironment);
     m_process.setProcessEnvironment(environment);
-    m_process.setWorkingDirectory(rootPath());
-    m_process.setProgram(programPath());
-    m_process.setArguments(arguments);
+    m_process.setWorkingDirectory(m_workingDirectory.isEmpty() ? rootPath() : m_workingDirectory);
+    if (m_closeStandardDescriptors) {
+        m_process.setProgram(QStringLiteral("/bin/sh"));
+        m_process.setArguments(QStringList { QStringLiteral("-c"), QStringLiteral("exec \"$0\" \"$@\" <&- >&- 2>&-"),
+                                             programPath() }
+                               + arguments);
+    } else {
+        m_process.setProgram(programPath());
+        m_process.setArguments(arguments);
+    }
     m_process.start();
     return waitUntil([this] { return m_process.state() != QProcess::Starting; }, 10000)
         && m_process.state() == QProcess::Running;

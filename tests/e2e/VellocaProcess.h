@@ -3,6 +3,7 @@
 #include <QByteArray>
 #include <QList>
 #include <QProcess>
+#include <QProcessEnvironment>
 #include <QString>
 #include <QStringList>
 #include <QTemporaryDir>
@@ -17,7 +18,8 @@
 class VellocaProcess
 {
 public:
-    VellocaProcess();
+    // With sameHomeAs, a second copy of the program in that one's home.
+    explicit VellocaProcess(const VellocaProcess *sameHomeAs = nullptr);
     ~VellocaProcess();
     VellocaProcess(const VellocaProcess &) = delete;
     VellocaProcess &operator=(const VellocaProcess &) = delete;
@@ -26,8 +28,8 @@ public:
     // the test program's own folder when that variable is not set.
     static QString programPath();
 
-    bool isValid() const { return m_root.isValid(); }
-    QString rootPath() const { return m_root.path(); }
+    bool isValid() const { return !m_home.isEmpty(); }
+    QString rootPath() const { return m_home; }
     QString configHome() const;      // $XDG_CONFIG_HOME
     QString configFolder() const;    // $XDG_CONFIG_HOME/velloca
     QString runtimeFolder() const;   // $XDG_RUNTIME_DIR
@@ -38,6 +40,11 @@ public:
     // Writes default.vlk with this text unless it is null, then starts the
     // program with the arguments. False when the program could not start.
     bool start(const QByteArray &defaultConfiguration, const QStringList &arguments = {});
+    // For the next start: the folder it runs in (default: rootPath()), an
+    // environment variable, and whether stdin, stdout and stderr are closed.
+    void setWorkingDirectory(const QString &folder) { m_workingDirectory = folder; }
+    void setEnvironmentValue(const QString &name, const QString &value) { m_extraEnvironment.insert(name, value); }
+    void setStandardDescriptorsClosed(bool closed) { m_closeStandardDescriptors = closed; }
 
     bool isRunning() const;
     qint64 processId() const;
@@ -68,6 +75,10 @@ public:
 
 private:
     QTemporaryDir m_root;
+    QString m_home;
+    QString m_workingDirectory;
+    QProcessEnvironment m_extraEnvironment;
+    bool m_closeStandardDescriptors = false;
     QProcess m_process;
     QByteArray m_stderr;
 };

@@ -143,6 +143,24 @@ TEST_F(MainWindowTest, OpenLoadsTheChosenFileButExitSavesTheDefaultFile)
     EXPECT_FALSE(readFile(QStringLiteral("other.vlk")).contains("MainLeft"));
 }
 
+TEST_F(MainWindowTest, OpenOfAFileThatCannotBeLoadedChangesNothingAndNewStopsAtTheSessionLimit)
+{
+    writeFile(QStringLiteral("default.vlk"), "[Velloca]\nNumSessions=256\n");
+    MainWindow window { QString() };
+    window.runStartUpNow();
+    ASSERT_EQ(window.sessionWindows().size(), 256);
+    window.mnuFileNew_Click();
+    EXPECT_EQ(window.sessionWindows().size(), 256);
+    ASSERT_EQ(messages.size(), 1);
+
+    nextFile = folder.path(); // a folder is no configuration file
+    window.mnuFileOpen_Click();
+    EXPECT_EQ(window.sessionWindows().size(), 256);
+    ASSERT_EQ(messages.size(), 2);
+    EXPECT_TRUE(messages[1].contains(folder.path())) << qPrintable(messages[1]);
+    EXPECT_TRUE(window.currentConfigFile().isEmpty());
+}
+
 TEST_F(MainWindowTest, RestoringAsksForThePasswordOnlyWhenOneIsSet)
 {
     MainWindow window { QString() };
@@ -211,10 +229,12 @@ TEST_F(MainWindowTest, ServiceSwitchesEndTheProgramBeforeAnythingIsLoaded)
         window.close();
         EXPECT_TRUE(readFile(QStringLiteral("default.vlk")).isEmpty()) << "nothing is saved";
     }
-    // A switch followed by more text is a file name.
+    // A switch followed by more text is a file name; this one is missing.
     MainWindow window(QStringLiteral("-I extra"));
+    int status = -1;
+    QObject::connect(&window, &MainWindow::finishedEarly, [&](int s) { status = s; });
     window.runStartUpNow();
-    EXPECT_TRUE(window.startUpDone());
+    EXPECT_EQ(status, 2);
 }
 
 } // namespace
