@@ -1,4 +1,5 @@
 #include "DisplayPlatform.h"
+#include "StandardDescriptors.h"
 
 #include "shell/MainWindow.h"
 #include "shell/UnixSignalWatcher.h"
@@ -7,6 +8,7 @@
 
 int main(int argc, char **argv)
 {
+    openMissingStandardDescriptors();
     chooseOffscreenPlatformWhenHeadless();
     QApplication app(argc, argv);
     QApplication::setApplicationName(QStringLiteral("Velloca"));

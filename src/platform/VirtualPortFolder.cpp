@@ -3,6 +3,7 @@
 #include <QDir>
 #include <QFile>
 #include <QFileInfo>
+#include <QRegularExpression>
 
 #include <cerrno>
 #include <cstring>
@@ -92,6 +93,12 @@ QString defaultVirtualPortFolder()
 int ResetBus(const QString &folder)
 {
     const QByteArray folderPath = QFile::encodeName(folder);
+    // Only in our own private folder: elsewhere the links are not ours.
+    struct stat info {};
+    if (::lstat(folderPath.constData(), &info) != 0 || !S_ISDIR(info.st_mode) || info.st_uid != ::geteuid()
+        || (info.st_mode & 07777) != 0700)
+        return 0;
+    static const QRegularExpression portName(QStringLiteral("^COM[1-9][0-9]{0,2}$"));
     DIR *directory = ::opendir(folderPath.constData());
     if (!directory)
         return 0;
@@ -101,7 +108,10 @@ int ResetBus(const QString &folder)
         if (entryName == "." || entryName == "..")
             continue;
         const QByteArray path = folderPath + '/' + entryName;
-        if (isStaleLink(path) && ::unlink(path.constData()) == 0)
+        // A link of ours is named for its port and names a pseudo-terminal.
+        const bool ours = portName.match(QFile::decodeName(entryName)).hasMatch()
+            && linkTarget(path).startsWith(QLatin1String("/dev/pts/"));
+        if (ours && isStaleLink(path) && ::unlink(path.constData()) == 0)
             ++removed;
     }
     ::closedir(directory);

@@ -9,8 +9,9 @@
 // $XDG_RUNTIME_DIR/velloca, or /tmp/velloca-<uid> without a runtime folder.
 QString defaultVirtualPortFolder();
 
-// Removes the links in the folder whose target no longer exists (left by a
-// program that ended without removing its ports); anything else stays.
+// Removes the links the program leaves when it ends without removing its
+// ports: named COM<n>, pointing into /dev/pts/ at a terminal that no longer
+// exists, in a folder of this user's with mode 0700. Anything else stays.
 // Returns how many were removed.
 int ResetBus(const QString &folder);
 

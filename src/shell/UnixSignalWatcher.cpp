@@ -12,6 +12,8 @@ namespace {
 // The write end is used from the signal handler, so it must be a plain int.
 int g_signalPipe[2] = { -1, -1 };
 
+constexpr int kTerminationSignals[] = { SIGTERM, SIGINT, SIGHUP };
+
 void forwardSignal(int signalNumber)
 {
     const unsigned char byte = static_cast<unsigned char>(signalNumber);
@@ -32,14 +34,16 @@ UnixSignalWatcher::UnixSignalWatcher(QObject *parent)
     action.sa_handler = forwardSignal;
     sigemptyset(&action.sa_mask);
     action.sa_flags = SA_RESTART;
-    sigaction(SIGTERM, &action, nullptr);
-    sigaction(SIGINT, &action, nullptr);
+    // A hang-up (the terminal closed, or `kill -HUP`) ends the program the
+    // same orderly way: saved, with its socket, lock and links cleaned up.
+    for (const int signalNumber : kTerminationSignals)
+        sigaction(signalNumber, &action, nullptr);
 }
 
 UnixSignalWatcher::~UnixSignalWatcher()
 {
-    signal(SIGTERM, SIG_DFL);
-    signal(SIGINT, SIG_DFL);
+    for (const int signalNumber : kTerminationSignals)
+        signal(signalNumber, SIG_DFL);
     for (int &fd : g_signalPipe) {
         if (fd >= 0)
             ::close(fd);

@@ -275,14 +275,24 @@ TEST(VirtualPort, ExistingEntriesAreReplacedOnlyWhenStaleOrOurs)
     EXPECT_TRUE(port.errorString().contains("a/b")) << port.errorString().toStdString();
 }
 
-TEST(VirtualPort, ResetBusRemovesOnlyStaleLinks)
+TEST(VirtualPort, ResetBusRemovesOnlyOurStaleLinks)
 {
     QTemporaryDir dir;
     const QString folder = dir.path();
     PtyVirtualPort live(folder);
     ASSERT_TRUE(live.createPort("COM1"));
-    ASSERT_EQ(::symlink("/dev/pts/999999", QFile::encodeName(folder + "/COM2").constData()), 0);
-    ASSERT_EQ(::symlink("/dev/null", QFile::encodeName(folder + "/COM3").constData()), 0);
+    auto link = [&](const char *target, const QString &name) {
+        return ::symlink(target, QFile::encodeName(folder + name).constData());
+    };
+    ASSERT_EQ(link("/dev/pts/999999", "/COM2"), 0);
+    ASSERT_EQ(link("/dev/null", "/COM3"), 0);
+    // Dangling too, but not ours: another name, or a target that is no pty.
+    ASSERT_EQ(link("/dev/pts/999998", "/backup"), 0);
+    ASSERT_EQ(link("/srv/gone/file", "/COM4"), 0);
+    // In a folder that is not private, not even a link of ours is touched.
+    ASSERT_EQ(::chmod(QFile::encodeName(folder).constData(), 0755), 0);
+    EXPECT_EQ(ResetBus(folder), 0);
+    ASSERT_EQ(::chmod(QFile::encodeName(folder).constData(), 0700), 0);
     QFile regular(folder + "/notes");
     ASSERT_TRUE(regular.open(QIODevice::WriteOnly));
     regular.close();
@@ -292,6 +302,8 @@ TEST(VirtualPort, ResetBusRemovesOnlyStaleLinks)
     EXPECT_FALSE(isSymlink(folder + "/COM2"));
     EXPECT_TRUE(isSymlink(folder + "/COM1"));
     EXPECT_TRUE(isSymlink(folder + "/COM3"));
+    EXPECT_TRUE(isSymlink(folder + "/COM4"));
+    EXPECT_TRUE(isSymlink(folder + "/backup"));
     EXPECT_TRUE(QFileInfo::exists(folder + "/notes"));
     EXPECT_TRUE(QFileInfo(folder + "/sub").isDir());
     EXPECT_EQ(ResetBus(folder), 0);
