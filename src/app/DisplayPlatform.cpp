@@ -3,15 +3,18 @@
 #include <QByteArray>
 #include <QtGlobal>
 
-void chooseOffscreenPlatformWhenHeadless()
+bool takeHeadlessChoice(QStringList &arguments)
 {
-    if (qEnvironmentVariableIsEmpty("QT_QPA_PLATFORM") && qEnvironmentVariableIsEmpty("DISPLAY")
-        && qEnvironmentVariableIsEmpty("WAYLAND_DISPLAY"))
-        qputenv("QT_QPA_PLATFORM", "offscreen");
+    const bool asked = arguments.removeAll(QStringLiteral("--headless")) > 0;
+    const QByteArray platform = qgetenv("QT_QPA_PLATFORM");
+    const bool noDisplay = platform.isEmpty() && qEnvironmentVariableIsEmpty("DISPLAY")
+        && qEnvironmentVariableIsEmpty("WAYLAND_DISPLAY");
+    const bool headless = asked || noDisplay || platform == "offscreen";
     // Headless there is no desktop whose GLib main loop must be shared. Qt's
     // own poll loop moves a block with three system calls (poll, read,
     // write); the GLib loop adds an eventfd wake-up each time a socket
     // notifier is switched on or off, which is once per block.
-    if (qgetenv("QT_QPA_PLATFORM") == "offscreen")
+    if (headless)
         qputenv("QT_NO_GLIB", "1");
+    return headless;
 }

@@ -1,7 +1,10 @@
 #pragma once
 
-// With no display at all (no DISPLAY, no WAYLAND_DISPLAY) and no platform
-// chosen by the user, Qt would abort at start-up; a bridge must keep running
-// headless, so pick the offscreen platform before QApplication exists. A
-// headless program also gets Qt's own event loop instead of GLib's.
-void chooseOffscreenPlatformWhenHeadless();
+#include <QStringList>
+
+// Whether the program runs headless: asked with --headless, or no display
+// at all (no DISPLAY, no WAYLAND_DISPLAY, no platform chosen by the user,
+// or Qt's offscreen platform). Headless it is a daemon on a Qt core
+// application: no widget, no platform plugin, and Qt's own event loop
+// instead of GLib's. Removes --headless from arguments.
+bool takeHeadlessChoice(QStringList &arguments);

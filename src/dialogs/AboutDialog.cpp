@@ -2,9 +2,9 @@
 #include "ui_AboutDialog.h"
 
 #include "SystemInfoTool.h"
-#include "localisation/ApplyResourceStrings.h"
+#include "viewsupport/ApplyResourceStrings.h"
 #include "localisation/ResourceStrings.h"
-#include "session/UserDialogs.h"
+#include "viewsupport/UserDialogs.h"
 
 #include <QDesktopServices>
 #include <QGuiApplication>

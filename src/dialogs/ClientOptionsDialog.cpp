@@ -4,7 +4,7 @@
 #include "DialogKeys.h"
 #include "OptionControls.h"
 #include "config/OptionsTransfer.h"
-#include "localisation/ApplyResourceStrings.h"
+#include "viewsupport/ApplyResourceStrings.h"
 
 #include <QKeyEvent>
 

@@ -4,8 +4,8 @@
 #include "OptionControls.h"
 #include "PacketSizeText.h"
 #include "config/GlobalOptions.h"
-#include "localisation/ApplyResourceStrings.h"
-#include "session/UserDialogs.h"
+#include "viewsupport/ApplyResourceStrings.h"
+#include "viewsupport/UserDialogs.h"
 
 namespace {
 

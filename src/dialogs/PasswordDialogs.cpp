@@ -3,9 +3,9 @@
 #include "ui_SetPasswordDialog.h"
 
 #include "config/GlobalOptions.h"
-#include "localisation/ApplyResourceStrings.h"
+#include "viewsupport/ApplyResourceStrings.h"
 #include "localisation/ResourceStrings.h"
-#include "session/UserDialogs.h"
+#include "viewsupport/UserDialogs.h"
 
 #include <QScreen>
 

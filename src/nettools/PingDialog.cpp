@@ -4,10 +4,10 @@
 #include "ui_PingDialog.h"
 
 #include "PingCode.h"
-#include "localisation/ApplyResourceStrings.h"
+#include "viewsupport/ApplyResourceStrings.h"
 #include "localisation/ResourceStrings.h"
 #include "platform/IcmpEcho.h"
-#include "session/UserDialogs.h"
+#include "viewsupport/UserDialogs.h"
 
 #include <QLineEdit>
 #include <QPushButton>

@@ -3,10 +3,10 @@
 #include "BusyForm.h"
 #include "ui_ResolveDialog.h"
 
-#include "localisation/ApplyResourceStrings.h"
+#include "viewsupport/ApplyResourceStrings.h"
 #include "localisation/ResourceStrings.h"
 #include "platform/IcmpEcho.h"
-#include "session/UserDialogs.h"
+#include "viewsupport/UserDialogs.h"
 
 #include <QPushButton>
 

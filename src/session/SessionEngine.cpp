@@ -20,6 +20,7 @@ SessionEngine::SessionEngine(SessionPlatform platform, QObject *parent)
     m_caption = LoadResString(5119) + QStringLiteral(" - ") + LoadResString(5120);
     m_commandTopic = SessionLists::connectorName(0);
     m_activateCaption = LoadResString(5009);
+    takeLocalAddress();
 }
 
 SessionEngine::~SessionEngine() = default;

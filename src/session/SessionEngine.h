@@ -15,6 +15,7 @@
 #include <vector>
 
 class SerialPortControl;
+struct SessionConfig;
 class SocketMember;
 class VirtualPortControl;
 
@@ -63,6 +64,12 @@ public:
     bool settingsLocked() const { return m_settingsLocked; }
     void setSettingsLocked(bool locked);
 
+    // The session's settings as one value. Applying takes each value the
+    // way the window's controls would (a list index beyond its list is left
+    // alone) and raises configurationChanged.
+    void applyConfiguration(const SessionConfig &config);
+    // The settings to save, with AutoActivate set while the session runs.
+    SessionConfig currentConfiguration() const;
     // Copy the routing options and login texts to / from the application's
     // options transfer variables.
     void Getstatus() const;
@@ -113,6 +120,7 @@ public:
     static constexpr int kTimer2IntervalMs = 50;
 
 Q_SIGNALS:
+    void configurationChanged();
     void statusLineChanged(int line, const QString &text);
     void captionChanged(const QString &caption);
     void commandTopicChanged(const QString &topic);
@@ -123,6 +131,10 @@ Q_SIGNALS:
     void serialSettingsChanged();
 
 private:
+    // Takes the machine's address as the local one; without any, the
+    // session can only be a client.
+    void takeLocalAddress();
+
     // Activation and deactivation.
     void activate();
     void deactivate();

@@ -1,33 +1,22 @@
-// The main window's life: start-up sequence, commands from other programs,
-// minimize and restore with the password check, and shutdown.
+// The main window's life: start-up, minimize and restore with the password
+// check, and shutdown.
 #include "MainWindow.h"
 #include "ui_MainWindow.h"
 
 #include "AppIcon.h"
+#include "SessionWindow.h"
 #include "config/GlobalOptions.h"
-#include "config/ProgramFolder.h"
 #include "dialogs/PasswordDialogs.h"
-#include "localisation/ApplyResourceStrings.h"
 #include "localisation/ResourceStrings.h"
-#include "config/ConfigurationFile.h"
-#include "platform/CommandChannel.h"
-#include "platform/FileLock.h"
-#include "platform/ServiceNotifier.h"
-#include "platform/ServiceSwitch.h"
-#include "platform/VirtualPortFolder.h"
 #include "session/SessionEngine.h"
-#include "session/SessionWindow.h"
-#include "session/UserDialogs.h"
+#include "session/SessionManager.h"
+#include "viewsupport/ApplyResourceStrings.h"
+#include "viewsupport/UserDialogs.h"
 
 #include <QApplication>
 #include <QCloseEvent>
-#include <QDir>
-#include <QFileInfo>
 #include <QGuiApplication>
-#include <QLockFile>
-#include <QRegularExpression>
 #include <QSystemTrayIcon>
-#include <QTextStream>
 
 namespace {
 
@@ -36,8 +25,11 @@ constexpr int kExitDelayMs = 500;
 
 } // namespace
 
-MainWindow::MainWindow(QString commandLine, QWidget *parent)
-    : QMainWindow(parent), m_ui(std::make_unique<Ui::MainWindow>()), m_commandLine(std::move(commandLine))
+MainWindow::MainWindow(QString commandLine, SessionManager *manager, QWidget *parent)
+    : QMainWindow(parent)
+    , m_ui(std::make_unique<Ui::MainWindow>())
+    , m_commandLine(std::move(commandLine))
+    , m_manager(manager ? manager : new SessionManager(this))
 {
     m_ui->setupUi(this);
     setCentralWidget(m_ui->mdiArea);
@@ -55,12 +47,36 @@ MainWindow::MainWindow(QString commandLine, QWidget *parent)
     askPassword = [this]() { return askForPassword(this); };
     wireDialogs();
 
+    m_manager->headless = isHeadless();
+    m_manager->tellUser = [this](const QString &text, bool critical) { tellUser(text, critical); };
+    connect(m_manager, &SessionManager::sessionAdded, this, &MainWindow::showSession);
+    connect(m_manager, &SessionManager::sessionRemoved, this, [this](SessionEngine *session) {
+        // Deleted at once, so the engine outlives no window of its own.
+        if (QPointer<SessionWindow> window = m_windows.take(session))
+            delete window->parentWidget();
+        m_ui->mnuFileClose->setEnabled(!m_windows.isEmpty());
+    });
+    connect(m_manager, &SessionManager::loaded, this, &MainWindow::takePlacement);
+    connect(m_manager, &SessionManager::exitRequested, this, &MainWindow::requestExit);
+    connect(m_manager, &SessionManager::finished, this, &MainWindow::finishedEarly);
+
     m_timer1.setInterval(kStartUpDelayMs);
     connect(&m_timer1, &QTimer::timeout, this, &MainWindow::Timer1_Tick);
     m_timer1.start();
 }
 
-MainWindow::~MainWindow() = default;
+MainWindow::~MainWindow()
+{
+    // The windows go first: they show engines the manager owns.
+    m_manager->disconnect(this);
+    for (const QPointer<SessionWindow> &window : std::as_const(m_windows))
+        delete window;
+}
+
+bool MainWindow::startUpDone() const
+{
+    return m_manager->startUpDone();
+}
 
 void MainWindow::Timer1_Tick()
 {
@@ -68,9 +84,9 @@ void MainWindow::Timer1_Tick()
         close();
         return;
     }
-    if (!m_startUpDone) {
+    if (!startUpDone()) {
         StartUpSequence();
-        if (m_startUpDone)
+        if (startUpDone())
             show();
     }
 }
@@ -90,118 +106,21 @@ void MainWindow::requestExit()
 
 bool MainWindow::executeCommand(const QString &topic, const QString &command)
 {
-    if (topic.compare(QStringLiteral("System"), Qt::CaseInsensitive) == 0) {
-        if (command.toUpper().trimmed() != QStringLiteral("[APPEXIT]"))
-            return false;
-        requestExit();
-        return true;
-    }
-    SessionWindow *session = sessionForTopic(topic);
-    return session && session->engine()->executeCommand(command);
-}
-
-SessionWindow *MainWindow::sessionForTopic(const QString &topic) const
-{
-    const QList<SessionWindow *> windows = sessionWindows();
-    static const QRegularExpression numbered(QStringLiteral("^Session([0-9]{1,9})$"),
-                                             QRegularExpression::CaseInsensitiveOption);
-    if (const auto match = numbered.match(topic); match.hasMatch()) {
-        const int n = match.captured(1).toInt();
-        return n >= 1 && n <= windows.size() ? windows[n - 1] : nullptr;
-    }
-    // Several sessions may share a connector name; the first one answers.
-    for (SessionWindow *window : windows) {
-        if (window->engine()->commandTopic().compare(topic, Qt::CaseInsensitive) == 0)
-            return window;
-    }
-    return nullptr;
+    return m_manager->executeCommand(topic, command);
 }
 
 void MainWindow::StartUpSequence()
 {
-    // The working folder is never changed: a relative file name on the
-    // command line means the folder the program was started in.
     ApplyResourceStrings(this);
     m_timer1.stop();
-    m_autoActivateList = { 0, 0 };
-
-    QString configFile;
-    if (!m_commandLine.isEmpty()) {
-        if (handleServiceSwitch(m_commandLine))
-            return;
-        configFile = QFileInfo(m_commandLine).absoluteFilePath();
-    }
+    if (m_manager->handleServiceSwitch(m_commandLine))
+        return;
     addTrayIcon();
-    if (!loadStartUpConfiguration(configFile))
-        return;
-    takeConfigurationLock();
-    openCommandChannel();
-    resetBusInFirstCopy();
-    autoActivate();
-    m_startUpDone = true;
-    notifyServiceReady();
-}
-
-bool MainWindow::loadStartUpConfiguration(const QString &namedFile)
-{
-    QString error;
-    if (!namedFile.isEmpty()) {
-        if (getprofilesettings(namedFile, &error)) {
-            m_exitSaveAllowed = true;
-            return true;
-        }
-        if (!reportLoadFailure(error))
-            return false;
-    }
-    if (getprofilesettings(QString(), &error)) {
-        m_exitSaveAllowed = true;
-        return true;
-    }
-    if (!reportLoadFailure(error))
-        return false;
-    // Nothing could be loaded: the user gets a new session, and the file
-    // that failed is never overwritten.
-    tellUser(LoadResString(5202), false);
-    NewSessionWindow();
-    return true;
-}
-
-// Headless nobody could answer for the lost file: the program ends before it
-// writes anything. With a display the user is told and the program goes on.
-bool MainWindow::reportLoadFailure(const QString &error)
-{
-    if (isHeadless()) {
-        QTextStream(stderr) << "velloca: " << LoadResString(5201) << ' ' << error << '\n';
-        Q_EMIT finishedEarly(2);
-        return false;
-    }
-    tellUser(LoadResString(5201) + u'\n' + error, true);
-    return true;
-}
-
-void MainWindow::takeConfigurationLock()
-{
-    const QString path = defaultConfigurationPath();
-    bool busy = false;
-    QString error;
-    m_configurationLock = FileLock::tryLock(path + QStringLiteral(".lock"), &busy, &error);
-    if (m_configurationLock)
-        return;
-    // Two copies saving one file at exit would leave only the last one's
-    // sessions; this copy runs but leaves the file to the other one.
-    m_exitSaveAllowed = false;
-    if (busy)
-        tellUser(LoadResString(5203) + u'\n' + path, false);
-    else
-        qWarning("velloca: %s", qPrintable(error));
+    m_manager->startUp(m_commandLine);
 }
 
 void MainWindow::tellUser(const QString &text, bool critical)
 {
-    if (isHeadless()) {
-        QTextStream(stderr) << "velloca: " << text << '\n';
-        return;
-    }
     UserDialogs::showMessage({ this, text, QStringLiteral("Velloca"),
                                critical ? UserDialogs::Icon::Critical : UserDialogs::Icon::Warning });
 }
@@ -209,61 +128,6 @@ void MainWindow::tellUser(const QString &text, bool critical)
 bool MainWindow::isHeadless() const
 {
     return QGuiApplication::platformName() == QStringLiteral("offscreen");
-}
-
-void MainWindow::openCommandChannel()
-{
-    m_commandChannel = new CommandChannel(
-        [this](const QString &topic, const QString &command) { return executeCommand(topic, command); }, this);
-    QString error;
-    if (!m_commandChannel->listen(defaultVirtualPortFolder(), &error))
-        qWarning("velloca: no command channel: %s", qPrintable(error));
-}
-
-bool MainWindow::handleServiceSwitch(const QString &commandLine)
-{
-    const ServiceSwitch serviceSwitch = parseServiceSwitch(commandLine);
-    if (serviceSwitch == ServiceSwitch::None)
-        return false;
-    const ServiceResult result = runServiceSwitch(serviceSwitch, QCoreApplication::applicationFilePath(), servicePaths);
-    if (result.messageId != 0) {
-        QString text = QString::fromLatin1(kServiceDisplayName) + u' ' + LoadResString(result.messageId);
-        if (!result.detail.isEmpty())
-            text += u'\n' + result.detail;
-        // Without a display nobody would see a box: the terminal gets it.
-        if (isHeadless())
-            QTextStream(stderr) << text << '\n';
-        else
-            UserDialogs::showMessage({ this, text, QStringLiteral("Velloca"),
-                                       result.critical ? UserDialogs::Icon::Critical : UserDialogs::Icon::Information });
-    }
-    Q_EMIT finishedEarly(result.ok ? 0 : 1);
-    return true;
-}
-
-void MainWindow::resetBusInFirstCopy()
-{
-    if (m_sessions.isEmpty())
-        return;
-    // The lock lives as long as this copy runs; a second copy does not get
-    // it and leaves the first copy's ports alone.
-    QString error;
-    if (!makeVirtualPortFolder(defaultVirtualPortFolder(), &error))
-        return;
-    m_instanceLock = std::make_unique<QLockFile>(defaultVirtualPortFolder() + QStringLiteral("/instance.lock"));
-    if (m_instanceLock->tryLock(0))
-        ResetBus(virtualPortFolder());
-}
-
-void MainWindow::autoActivate()
-{
-    const QList<SessionWindow *> windows = sessionWindows();
-    for (int n = 1; n <= windows.size() && n < m_autoActivateList.size(); ++n) {
-        if (m_autoActivateList[n] != 1)
-            continue;
-        windows[n - 1]->engine()->Command1_Click();
-        m_autoActivateList[n] = 0;
-    }
 }
 
 void MainWindow::changeEvent(QEvent *event)
@@ -319,12 +183,9 @@ void MainWindow::shutdown()
     if (m_shutDown)
         return;
     m_shutDown = true;
-    notifyServiceStopping();
     m_timer1.stop();
-    // Before the configuration was loaded there is nothing to save, and
-    // saving would overwrite the file with an empty one.
-    if (m_startUpDone && m_exitSaveAllowed)
-        writeprofilesettings(QString());
+    putPlacement();
+    m_manager->shutDown();
     if (m_trayIcon)
         m_trayIcon->hide();
     // Quitting ends every event loop, also that of a dialog still open; the

@@ -13,8 +13,9 @@
 #include "nettools/PingDialog.h"
 #include "nettools/ResolveDialog.h"
 #include "session/SessionEngine.h"
-#include "session/SessionWindow.h"
-#include "session/UserDialogs.h"
+#include "session/SessionManager.h"
+#include "shell/SessionWindow.h"
+#include "viewsupport/UserDialogs.h"
 
 #include <QApplication>
 #include <QCursor>
@@ -105,11 +106,8 @@ void MainWindow::rebuildWindowMenu()
 
 void MainWindow::mnuFileNew_Click()
 {
-    if (sessionWindows().size() >= kMaxSessionsRead) {
+    if (!NewSessionWindow())
         UserDialogs::showMessage({ this, LoadResString(5205), QStringLiteral("Velloca"), UserDialogs::Icon::Warning });
-        return;
-    }
-    NewSessionWindow();
 }
 
 void MainWindow::mnuFileOpen_Click()
@@ -125,7 +123,7 @@ void MainWindow::mnuFileOpen_Click()
     }
     m_currentConfigFile = *file;
     // The file that is open now is the one whose sessions an exit saves.
-    m_exitSaveAllowed = m_configurationLock != nullptr;
+    m_manager->takeOverLoadedFile();
 }
 
 void MainWindow::mnuFileClose_Click()

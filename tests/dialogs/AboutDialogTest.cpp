@@ -4,7 +4,7 @@
 #include "dialogs/AboutDialog.h"
 #include "dialogs/SystemInfoTool.h"
 #include "localisation/ResourceStrings.h"
-#include "localisation/UiLanguageScope.h"
+#include "support/UiLanguageScope.h"
 #include "support/Wait.h"
 
 #include <QFile>

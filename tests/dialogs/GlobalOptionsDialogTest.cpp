@@ -3,8 +3,8 @@
 #include "config/GlobalOptions.h"
 #include "dialogs/GlobalOptionsDialog.h"
 #include "localisation/ResourceStrings.h"
-#include "localisation/UiLanguageScope.h"
-#include "session/UserDialogs.h"
+#include "support/UiLanguageScope.h"
+#include "viewsupport/UserDialogs.h"
 
 #include <QComboBox>
 #include <QLabel>

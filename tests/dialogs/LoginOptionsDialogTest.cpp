@@ -1,7 +1,7 @@
 #include "DialogTestSupport.h"
 
 #include "dialogs/LoginOptionsDialog.h"
-#include "localisation/UiLanguageScope.h"
+#include "support/UiLanguageScope.h"
 
 #include <QLabel>
 #include <QLineEdit>

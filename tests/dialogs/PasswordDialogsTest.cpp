@@ -4,7 +4,7 @@
 #include "config/GlobalOptions.h"
 #include "dialogs/PasswordDialogs.h"
 #include "localisation/ResourceStrings.h"
-#include "localisation/UiLanguageScope.h"
+#include "support/UiLanguageScope.h"
 
 #include <QLabel>
 #include <QLineEdit>

@@ -51,6 +51,9 @@ TEST(ShutdownE2e, SigtermWhileActiveSavesTheSessionsKeepsForeignLinesAndLeavesNo
     ASSERT_TRUE(waitUntil([&] { return client.state() == QAbstractSocket::ConnectedState; }));
     ASSERT_TRUE(velloca.waitForLogLine(serverLogLine(QStringLiteral("Connected (1)"), activePort)));
     EXPECT_TRUE(velloca.processesOfThisRun().contains(velloca.processId()));
+    // Headless the program is a daemon: no platform plugin, so no GUI at all.
+    const QString maps = fileText(QStringLiteral("/proc/%1/maps").arg(velloca.processId()));
+    EXPECT_FALSE(maps.contains(QStringLiteral("/platforms/"))) << "a Qt platform plugin was loaded";
 
     ASSERT_TRUE(velloca.terminate(2000)) << "still running 2 s after SIGTERM";
     EXPECT_EQ(velloca.exitStatus(), QProcess::NormalExit);

@@ -1,6 +1,6 @@
 #pragma once
 
-#include "session/UserDialogs.h"
+#include "viewsupport/UserDialogs.h"
 #include "support/IcmpPermissions.h"
 
 #include <QAbstractButton>

@@ -1,8 +1,9 @@
 #include "config/GlobalOptions.h"
 #include "config/ProgramFolder.h"
 #include "session/SessionEngine.h"
-#include "session/SessionWindow.h"
-#include "session/UserDialogs.h"
+#include "shell/SessionWindow.h"
+#include "viewsupport/UserDialogs.h"
+#include "session/SessionManager.h"
 #include "shell/MainWindow.h"
 #include "support/Wait.h"
 
@@ -219,7 +220,7 @@ TEST_F(MainWindowTest, ServiceSwitchesEndTheProgramBeforeAnythingIsLoaded)
     paths.systemctl = folder.filePath(QStringLiteral("no-systemctl"));
     for (const char *commandLine : { " -i ", "/U", "-IH" }) {
         MainWindow window(QString::fromLatin1(commandLine));
-        window.servicePaths = paths;
+        window.manager()->servicePaths = paths;
         int status = -1;
         QObject::connect(&window, &MainWindow::finishedEarly, [&](int s) { status = s; });
         window.runStartUpNow();

@@ -1,6 +1,5 @@
-// GoogleTest entry point with a Qt application, so tests can run the event
-// loop (sockets, notifiers, timers) and create widgets on the offscreen
-// platform. Every test case runs in its own process (CTest), so the
+// GoogleTest entry point for the views' tests: a Qt widget application on
+// the offscreen platform. Every test case runs in its own process (CTest), so the
 // environment set here is the test's own.
 #include <QApplication>
 #include <gmock/gmock.h>

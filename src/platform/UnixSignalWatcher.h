@@ -4,7 +4,7 @@
 
 class QSocketNotifier;
 
-// Turns SIGTERM and SIGINT into a Qt signal on the event loop, so that a
+// Turns SIGTERM, SIGINT and SIGHUP into a Qt signal on the event loop, so that a
 // service stop or Ctrl+C runs the normal shutdown (save, clean up) instead
 // of killing the program in the middle of a handler.
 class UnixSignalWatcher : public QObject

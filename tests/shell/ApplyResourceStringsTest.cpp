@@ -1,6 +1,6 @@
-#include "UiLanguageScope.h"
+#include "support/UiLanguageScope.h"
 
-#include "localisation/ApplyResourceStrings.h"
+#include "viewsupport/ApplyResourceStrings.h"
 
 #include <QComboBox>
 #include <QGroupBox>

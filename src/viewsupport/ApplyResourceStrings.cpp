@@ -1,6 +1,6 @@
 #include "ApplyResourceStrings.h"
 
-#include "ResourceStrings.h"
+#include "localisation/ResourceStrings.h"
 
 #include <QAbstractButton>
 #include <QAbstractItemModel>

@@ -45,7 +45,7 @@ protected:
 
 private:
     void fillLists();
-    void takeLocalAddress();
+    void showConfiguration();
     void bindSettings();
     void bindEngine();
     void TCPOption_Click(int index);

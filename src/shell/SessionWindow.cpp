@@ -1,16 +1,16 @@
 #include "SessionWindow.h"
 #include "ui_SessionWindow.h"
 
-#include "NumberText.h"
 #include "config/ConfigurationFile.h"
 #include "config/GlobalOptions.h"
 #include "config/OptionsTransfer.h"
-#include "SessionEngine.h"
-#include "UserDialogs.h"
-#include "localisation/ApplyResourceStrings.h"
 #include "localisation/ResourceStrings.h"
 #include "platform/LocalAddresses.h"
 #include "platform/SocketMember.h"
+#include "session/NumberText.h"
+#include "session/SessionEngine.h"
+#include "viewsupport/ApplyResourceStrings.h"
+#include "viewsupport/UserDialogs.h"
 
 #include <QCoreApplication>
 #include <QEvent>
@@ -63,10 +63,8 @@ SessionWindow::SessionWindow(SessionEngine *engine, QWidget *parent)
     ApplyResourceStrings(this);
     PingTimeoutMs = 1000;
     fillLists();
-    takeLocalAddress();
-    m_engine->record().AllowMultiConnect = 1;
-    m_engine->record().ConnectOnVirtualOpen = 1;
-
+    m_ui->LocalIP->addItems(localIPv4Addresses());
+    showConfiguration();
     bindSettings();
     bindEngine();
     m_ui->Frame2->installEventFilter(this);
@@ -92,28 +90,36 @@ void SessionWindow::fillLists()
     m_ui->Combo1_5->setCurrentIndex(2);
 }
 
-void SessionWindow::takeLocalAddress()
+void SessionWindow::showConfiguration()
 {
-    m_ui->LocalIP->addItems(localIPv4Addresses());
-    SessionRecord &record = m_engine->record();
-    record.LocalIPAddress = m_engine->socket(0)->localIP();
-    if (record.LocalIPAddress.isEmpty()) {
-        // Without an address of its own the machine cannot serve.
-        m_ui->TCPOption_1->setEnabled(false);
-        record.TCPOption = 0;
-    } else {
-        m_ui->LocalIP->setEditText(record.LocalIPAddress);
-        m_ui->TCPOption_1->setEnabled(true);
-    }
-    m_engine->settings().LocalIP = m_ui->LocalIP->currentText();
-    TCPOption_Click(0);
+    const SessionSettings &s = m_engine->settings();
+    auto select = [](QComboBox *box, int index) {
+        if (index >= 0 && index < box->count())
+            box->setCurrentIndex(index);
+    };
+    select(m_ui->Combo2, s.Connector);
+    select(m_ui->Combo1_0, s.BaudRate);
+    select(m_ui->Combo1_1, s.Parity);
+    select(m_ui->Combo1_2, s.Databits);
+    select(m_ui->Combo1_3, s.Stopbits);
+    select(m_ui->Combo1_4, s.FlowControl);
+    select(m_ui->Combo1_5, s.BufferSize);
+    m_ui->BufferSerData->setChecked(s.BufferSerialData == 1);
+    m_ui->chkVPort->setChecked(s.CreateVirtualPort == 1);
+    m_ui->chkUDP->setChecked(s.UseUDP == 1);
+    m_ui->WaitForCr->setChecked(s.WaitForCr == 1);
+    m_ui->LocalIP->setEditText(s.LocalIP);
+    m_ui->IPAddress->setText(s.IPAddress);
+    m_ui->PortNumber->setText(s.PortNumber);
+    m_ui->txtTimeoutValue->setText(s.TimeoutValue);
+    (s.TCPOption == 0 ? m_ui->TCPOption_0 : m_ui->TCPOption_1)->setChecked(true);
+    TCPOption_Click(s.TCPOption == 0 ? 0 : 1);
+    applyLock(m_engine->settingsLocked());
 }
 
 void SessionWindow::bindSettings()
 {
-    SessionSettings &s = m_engine->settings();
     auto bindList = [this](QComboBox *box, int SessionSettings::*field) {
-        m_engine->settings().*field = box->currentIndex();
         connect(box, &QComboBox::currentIndexChanged, this,
                 [this, field](int index) { m_engine->settings().*field = index; });
     };
@@ -124,13 +130,10 @@ void SessionWindow::bindSettings()
     bindList(m_ui->Combo1_4, &SessionSettings::FlowControl);
     bindList(m_ui->Combo1_5, &SessionSettings::BufferSize);
 
-    s.Connector = m_ui->Combo2->currentIndex();
-    s.ConnectorText = m_ui->Combo2->currentText();
     connect(m_ui->Combo2, &QComboBox::activated, this, &SessionWindow::Combo2_Click);
     connect(m_ui->Combo2, &QComboBox::editTextChanged, this, &SessionWindow::Combo2_EditTextChanged);
 
     auto bindCheck = [this](QAbstractButton *box, int SessionSettings::*field) {
-        m_engine->settings().*field = box->isChecked() ? 1 : 0;
         connect(box, &QAbstractButton::toggled, this,
                 [this, field](bool on) { m_engine->settings().*field = on ? 1 : 0; });
     };
@@ -149,7 +152,6 @@ void SessionWindow::bindSettings()
     });
 
     auto bindText = [this](QLineEdit *edit, QString SessionSettings::*field) {
-        m_engine->settings().*field = edit->text();
         connect(edit, &QLineEdit::textChanged, this,
                 [this, field](const QString &text) { m_engine->settings().*field = text; });
     };
@@ -193,15 +195,8 @@ void SessionWindow::bindEngine()
     connect(m_engine, &SessionEngine::lampChanged, this, showLamp);
     connect(m_ui->Command1, &QPushButton::clicked, m_engine, &SessionEngine::Command1_Click);
 
-    connect(m_engine, &SessionEngine::serialSettingsChanged, this, [this] {
-        const SessionSettings &s = m_engine->settings();
-        m_ui->Combo1_0->setCurrentIndex(s.BaudRate);
-        m_ui->Combo1_1->setCurrentIndex(s.Parity);
-        m_ui->Combo1_2->setCurrentIndex(s.Databits);
-        m_ui->Combo1_3->setCurrentIndex(s.Stopbits);
-    });
-
-    applyLock(m_engine->settingsLocked());
+    connect(m_engine, &SessionEngine::serialSettingsChanged, this, &SessionWindow::showConfiguration);
+    connect(m_engine, &SessionEngine::configurationChanged, this, &SessionWindow::showConfiguration);
     connect(m_engine, &SessionEngine::settingsLockChanged, this, &SessionWindow::applyLock);
 }
 
@@ -327,49 +322,10 @@ bool SessionWindow::eventFilter(QObject *watched, QEvent *event)
 
 void SessionWindow::applyConfiguration(const SessionConfig &config)
 {
-    const SessionSettings &s = config.settings;
-    auto select = [](QComboBox *box, int index) {
-        if (index >= 0 && index < box->count())
-            box->setCurrentIndex(index);
-    };
-    select(m_ui->Combo2, s.Connector);
-    m_engine->setCommandTopic(m_ui->Combo2->currentText());
-    select(m_ui->Combo1_0, s.BaudRate);
-    select(m_ui->Combo1_1, s.Parity);
-    select(m_ui->Combo1_2, s.Databits);
-    select(m_ui->Combo1_3, s.Stopbits);
-    select(m_ui->Combo1_4, s.FlowControl);
-    select(m_ui->Combo1_5, s.BufferSize);
-    m_ui->BufferSerData->setChecked(s.BufferSerialData == 1);
-    m_ui->chkVPort->setChecked(s.CreateVirtualPort == 1);
-    m_ui->chkUDP->setChecked(s.UseUDP == 1);
-    m_ui->LocalIP->setEditText(s.LocalIP);
-    m_ui->IPAddress->setText(s.IPAddress);
-    m_ui->PortNumber->setText(s.PortNumber);
-    if (s.TCPOption == 0)
-        m_ui->TCPOption_0->setChecked(true);
-    else
-        m_ui->TCPOption_1->setChecked(true);
-    TCPOption_Click(s.TCPOption == 0 ? 0 : 1);
-
-    OptionsTransfer::global() = config.options;
-    m_engine->UpdateStatus();
-
-    m_ui->WaitForCr->setChecked(s.WaitForCr == 1);
-    m_ui->txtTimeoutValue->setText(s.TimeoutValue);
-    if (!s.SessionDescription.isEmpty()) {
-        m_engine->settings().SessionDescription = s.SessionDescription;
-        m_engine->setCaption(s.SessionDescription);
-    }
+    m_engine->applyConfiguration(config);
 }
 
 SessionConfig SessionWindow::currentConfiguration() const
 {
-    SessionConfig config;
-    config.settings = m_engine->settings();
-    config.settings.TCPOption = m_ui->TCPOption_1->isChecked() ? 1 : 0;
-    m_engine->Getstatus();
-    config.options = OptionsTransfer::global();
-    config.AutoActivate = m_engine->isActive() ? 1 : 0;
-    return config;
+    return m_engine->currentConfiguration();
 }

@@ -1,0 +1,12 @@
+# Fails when one of PROGRAMS (separated by |) loads Qt Gui or Qt Widgets.
+string(REPLACE "|" ";" programs "${PROGRAMS}")
+foreach(program IN LISTS programs)
+    execute_process(COMMAND ldd ${program} OUTPUT_VARIABLE libraries RESULT_VARIABLE failed)
+    if(failed)
+        message(FATAL_ERROR "ldd ${program} failed")
+    endif()
+    if(libraries MATCHES "libQt6(Gui|Widgets)")
+        message(FATAL_ERROR "${program} links ${CMAKE_MATCH_0}: the core must not use Qt Gui or Widgets")
+    endif()
+endforeach()
+message(STATUS "core programs link no Qt Gui or Widgets")
