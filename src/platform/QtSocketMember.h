@@ -79,7 +79,7 @@ private:
     void handleTcpDisconnected();
     void handleTcpStateChanged(QAbstractSocket::SocketState socketState);
     void handleConnectionRequest(qintptr descriptor);
-    void handleAcceptError(QAbstractSocket::SocketError error);
+    void handleAcceptFailure(int errorNumber);
     void handleUdpReadyRead();
     void handleUdpError(QAbstractSocket::SocketError error);
 
