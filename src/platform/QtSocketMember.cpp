@@ -14,6 +14,7 @@
 #include <QUdpSocket>
 
 #include <cstring>
+#include <poll.h>
 #include <unistd.h>
 
 namespace {
@@ -402,6 +403,19 @@ qint64 QtSocketMember::bytesToWrite() const
     return m_tcp ? m_tcp->bytesToWrite() : 0;
 }
 
+qint64 QtSocketMember::bytesHeldBack() const
+{
+    if (m_protocol == Udp)
+        return m_waitingBytes;
+    if (!m_tcp || m_tcp->bytesToWrite() == 0)
+        return 0;
+    // Bytes that the kernel would take have simply not been written yet.
+    pollfd writable { int(m_tcp->socketDescriptor()), POLLOUT, 0 };
+    if (::poll(&writable, 1, 0) > 0 && (writable.revents & POLLOUT))
+        return 0;
+    return m_tcp->bytesToWrite();
+}
+
 void QtSocketMember::setReadBufferSize(qint64 bytes)
 {
     m_readBufferSize = qMax<qint64>(0, bytes);
@@ -413,6 +427,15 @@ void QtSocketMember::close()
 {
     releaseTransport();
     m_state = StateClosed;
+}
+
+void QtSocketMember::abort()
+{
+    if (QTcpSocket *socket = m_tcp) {
+        socket->disconnect(this);
+        socket->abort();
+    }
+    close();
 }
 
 int QtSocketMember::lastError() const

@@ -67,8 +67,10 @@ public:
     QByteArray getData(qint64 maxBytes = -1) override;
     qint64 bytesAvailable() const override;
     qint64 bytesToWrite() const override;
+    qint64 bytesHeldBack() const override;
     void setReadBufferSize(qint64 bytes) override;
     void close() override;
+    void abort() override;
 
     int lastError() const override;
     QString errorString() const override;
