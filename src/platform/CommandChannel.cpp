@@ -1,8 +1,9 @@
 #include "CommandChannel.h"
 
+#include "CommandConnection.h"
+#include "ConnectionAcceptor.h"
+
 #include <QFile>
-#include <QLocalServer>
-#include <QLocalSocket>
 #include <QPointer>
 #include <QStringDecoder>
 
@@ -20,6 +21,9 @@ constexpr qsizetype kLineBufferSize = kCommandLineMaxLength + 2;
 // A client that sends requests but never reads the replies is read no
 // further once this much is waiting to go out to it.
 constexpr qint64 kMaxUnsentReplyBytes = 64 * 1024;
+// Clients of a burst (a script starting several at once) must not be turned
+// away before the event loop gets to accept them.
+constexpr int kListenBacklog = 128;
 
 QString systemError(int error)
 {
@@ -81,27 +85,31 @@ QString commandChannelPath(const QString &folder)
 }
 
 CommandChannel::CommandChannel(Handler handler, QObject *parent)
-    : QObject(parent)
-    , m_handler(std::move(handler))
-    , m_server(new QLocalServer(this))
+    : QObject(parent), m_handler(std::move(handler))
 {
-    // Clients of a burst (a script starting several at once) must not be
-    // turned away before the event loop gets to accept them.
-    m_server->setMaxPendingConnections(128);
-    connect(m_server, &QLocalServer::newConnection, this, &CommandChannel::acceptConnections);
 }
 
 CommandChannel::~CommandChannel()
 {
-    for (QLocalSocket *socket : m_clients.keys())
+    for (CommandConnection *socket : m_clients.keys())
         socket->disconnect(this);
-    m_server->close();
-    delete m_server;
+    stopListening();
 }
 
 bool CommandChannel::isListening() const
 {
-    return m_server->isListening();
+    return m_listener >= 0;
+}
+
+void CommandChannel::stopListening()
+{
+    if (m_listener < 0)
+        return;
+    delete m_acceptor;
+    m_acceptor = nullptr;
+    ::close(m_listener);
+    m_listener = -1;
+    ::unlink(QFile::encodeName(m_socketPath).constData());
 }
 
 bool CommandChannel::fail(QString *error, const QString &reason)
@@ -155,48 +163,60 @@ bool CommandChannel::listenAt(const QString &path, QString *error)
     const QByteArray encoded = QFile::encodeName(path);
     if (size_t(encoded.size()) >= sizeof(sockaddr_un::sun_path))
         return fail(error, QStringLiteral("The command channel path %1 is too long for a local socket").arg(path));
-    m_server->setSocketOptions(QLocalServer::UserAccessOption);
-    if (!m_server->listen(path))
-        return fail(error, QStringLiteral("Cannot listen on %1: %2").arg(path, m_server->errorString()));
-    // Connecting needs only write permission; the option above leaves the
-    // socket executable as well.
+    const int listener = ::socket(AF_UNIX, SOCK_STREAM | SOCK_NONBLOCK | SOCK_CLOEXEC, 0);
+    sockaddr_un address {};
+    address.sun_family = AF_UNIX;
+    std::memcpy(address.sun_path, encoded.constData(), size_t(encoded.size()));
+    if (listener < 0 || ::bind(listener, reinterpret_cast<const sockaddr *>(&address), sizeof address) != 0
+        || ::listen(listener, kListenBacklog) != 0) {
+        const int reason = errno;
+        if (listener >= 0)
+            ::close(listener);
+        return fail(error, QStringLiteral("Cannot listen on %1: %2").arg(path, systemError(reason)));
+    }
+    m_listener = listener;
+    m_socketPath = path;
+    // Connecting needs only write permission. The folder is private, so
+    // nobody else could connect before this.
     struct stat info {};
     const bool private_ = ::chmod(encoded.constData(), 0600) == 0
         && ::lstat(encoded.constData(), &info) == 0 && S_ISSOCK(info.st_mode)
         && (info.st_mode & 0777) == 0600 && info.st_uid == ::geteuid();
     if (!private_) {
         const int reason = errno;
-        m_server->close();
+        stopListening();
+        m_socketPath.clear();
         return fail(error, QStringLiteral("Cannot make the command channel %1 private: %2")
                                .arg(path, systemError(reason)));
     }
-    m_socketPath = path;
+    m_acceptor = new ConnectionAcceptor(m_listener, this);
+    connect(m_acceptor, &ConnectionAcceptor::accepted, this, &CommandChannel::acceptConnection);
+    connect(m_acceptor, &ConnectionAcceptor::acceptFailed, this, [this](int reason) {
+        qWarning("velloca: command channel %s: cannot accept connections: %s; waiting clients are turned away for now",
+                 qPrintable(m_socketPath), qPrintable(systemError(reason)));
+    });
+    m_acceptor->setEnabled(true);
     return true;
 }
 
-void CommandChannel::acceptConnections()
+void CommandChannel::acceptConnection(qintptr descriptor)
 {
-    while (QLocalSocket *socket = m_server->nextPendingConnection()) {
-        // Bounds what Qt buffers for this client; the kernel holds the rest
-        // and the client's writes wait.
-        socket->setReadBufferSize(kLineBufferSize);
-        m_clients.insert(socket, Client {});
-        connect(socket, &QLocalSocket::readyRead, this, [this, socket] { serviceClient(socket); });
-        connect(socket, &QLocalSocket::bytesWritten, this, [this, socket] { serviceClient(socket); });
-        connect(socket, &QLocalSocket::disconnected, this, [this, socket] { handleDisconnected(socket); });
-        serviceClient(socket);
-    }
+    auto *socket = new CommandConnection(int(descriptor), kLineBufferSize, this);
+    m_clients.insert(socket, Client {});
+    connect(socket, &CommandConnection::readyRead, this, [this, socket] { serviceClient(socket); });
+    connect(socket, &CommandConnection::bytesWritten, this, [this, socket] { serviceClient(socket); });
+    connect(socket, &CommandConnection::finished, this, [this, socket] { release(socket); });
 }
 
 // Takes the client's next line, if complete, and queues it. A socket may be
 // released in here: callers touch it no more afterwards.
-void CommandChannel::serviceClient(QLocalSocket *socket)
+void CommandChannel::serviceClient(CommandConnection *socket)
 {
     for (;;) {
         auto client = m_clients.find(socket);
         if (client == m_clients.end() || client->awaitingReply || client->closing)
             return;
-        if (!client->peerGone && socket->bytesToWrite() > kMaxUnsentReplyBytes)
+        if (socket->bytesToWrite() > kMaxUnsentReplyBytes)
             return;
         qsizetype end = client->unparsed.indexOf('\n');
         if (end < 0 && client->unparsed.size() < kLineBufferSize) {
@@ -206,8 +226,8 @@ void CommandChannel::serviceClient(QLocalSocket *socket)
         if (end < 0) {
             if (client->unparsed.size() >= kLineBufferSize)
                 refuseAndClose(socket);
-            else if (client->peerGone)
-                release(socket); // an unfinished line nobody is left to answer
+            else if (socket->inputEnded())
+                closeClient(socket); // an unfinished line is dropped
             return;
         }
         QByteArray line = client->unparsed.left(end);
@@ -228,21 +248,6 @@ void CommandChannel::serviceClient(QLocalSocket *socket)
         processQueue();
         return;
     }
-}
-
-void CommandChannel::handleDisconnected(QLocalSocket *socket)
-{
-    auto client = m_clients.find(socket);
-    if (client == m_clients.end())
-        return;
-    client->peerGone = true;
-    if (client->closing) {
-        release(socket);
-        return;
-    }
-    // Complete lines sent before the client hung up are still carried out
-    // (a client may send and close without waiting for the reply).
-    serviceClient(socket);
 }
 
 void CommandChannel::processQueue()
@@ -266,30 +271,32 @@ void CommandChannel::processQueue()
     m_handling = false;
 }
 
-void CommandChannel::reply(QLocalSocket *socket, bool accepted)
+// Complete lines sent before the client hung up are still carried out (a
+// client may send and close without waiting for the reply); the reply is
+// then dropped.
+void CommandChannel::reply(CommandConnection *socket, bool accepted)
 {
-    const auto client = m_clients.constFind(socket);
-    if (client == m_clients.cend() || client->peerGone)
-        return;
-    socket->write(QByteArray(accepted ? kCommandAccepted : kCommandRefused) + '\n');
+    if (m_clients.contains(socket))
+        socket->write(QByteArray(accepted ? kCommandAccepted : kCommandRefused) + '\n');
 }
 
-void CommandChannel::refuseAndClose(QLocalSocket *socket)
+void CommandChannel::refuseAndClose(CommandConnection *socket)
 {
     reply(socket, false);
+    closeClient(socket);
+}
+
+// The replies are sent first; finished() then releases the socket (possibly
+// from inside this call).
+void CommandChannel::closeClient(CommandConnection *socket)
+{
     auto client = m_clients.find(socket);
     client->closing = true;
     client->unparsed.clear();
-    if (client->peerGone) {
-        release(socket);
-        return;
-    }
-    // The refusal is sent first; disconnected() then releases the socket
-    // (possibly from inside this call).
-    socket->disconnectFromServer();
+    socket->closeAfterWriting();
 }
 
-void CommandChannel::release(QLocalSocket *socket)
+void CommandChannel::release(CommandConnection *socket)
 {
     m_clients.remove(socket);
     socket->disconnect(this);

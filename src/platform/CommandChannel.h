@@ -9,14 +9,15 @@
 
 #include <functional>
 
-class QLocalServer;
-class QLocalSocket;
+class CommandConnection;
+class ConnectionAcceptor;
 
 // Other programs of the same user remote-control Velloca through a local
 // socket, <folder>/control (mode 0600 in a 0700 folder). One request per
 // line: topic, a tab, the command text in UTF-8, ended by LF (a CR before
 // it is dropped). One reply line per request, in order: "accepted" or
-// "refused".
+// "refused". A client may shut down its sending side after its requests:
+// every complete line is still answered, then the connection is closed.
 
 // The longest request line, terminator excluded. A longer line is refused
 // and its connection closed, so a client cannot make the program buffer
@@ -52,6 +53,10 @@ public:
     // Closes every connection and removes the socket file.
     ~CommandChannel() override;
 
+    // When accepting fails (no descriptors left), waiting clients are
+    // turned away, the channel rests for a moment and then listens on; the
+    // socket file stays. One warning per episode goes to stderr.
+
     // Creates the folder when missing (it must be the user's own, mode 0700)
     // and listens on <folder>/control. A control socket that still answers
     // belongs to another running program: this one then takes
@@ -72,30 +77,31 @@ private:
     {
         QByteArray unparsed;
         bool awaitingReply = false;
-        bool peerGone = false;
         bool closing = false;
     };
     struct Request
     {
-        QLocalSocket *socket = nullptr;
+        CommandConnection *socket = nullptr;
         QString topic;
         QString command;
     };
 
     bool fail(QString *error, const QString &reason);
     bool listenAt(const QString &path, QString *error);
-    void acceptConnections();
-    void serviceClient(QLocalSocket *socket);
-    void handleDisconnected(QLocalSocket *socket);
+    void acceptConnection(qintptr descriptor);
+    void serviceClient(CommandConnection *socket);
     void processQueue();
-    void reply(QLocalSocket *socket, bool accepted);
-    void refuseAndClose(QLocalSocket *socket);
-    void release(QLocalSocket *socket);
+    void reply(CommandConnection *socket, bool accepted);
+    void refuseAndClose(CommandConnection *socket);
+    void closeClient(CommandConnection *socket);
+    void release(CommandConnection *socket);
+    void stopListening();
 
     Handler m_handler;
-    QLocalServer *m_server = nullptr;
+    int m_listener = -1;
+    ConnectionAcceptor *m_acceptor = nullptr;
     QString m_socketPath;
-    QHash<QLocalSocket *, Client> m_clients;
+    QHash<CommandConnection *, Client> m_clients;
     QList<Request> m_queue;
     bool m_handling = false;
 };

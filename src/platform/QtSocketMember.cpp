@@ -13,6 +13,8 @@
 #include <QTimer>
 #include <QUdpSocket>
 
+#include <cstring>
+#include <poll.h>
 #include <unistd.h>
 
 namespace {
@@ -158,7 +160,7 @@ bool QtSocketMember::bindTcp(int port, const QHostAddress &address, const QStrin
 {
     auto *server = new ConnectionRequestServer(this);
     server->setProxy(QNetworkProxy::NoProxy);
-    if (!server->listen(address, quint16(port))) {
+    if (!server->listenHeld(address, quint16(port))) {
         const SocketFailure failure = describeSocketError(
             server->serverError(), SocketActivity::Binding, addressText, port, server->errorString());
         delete server;
@@ -166,10 +168,9 @@ bool QtSocketMember::bindTcp(int port, const QHostAddress &address, const QStrin
     }
     // The kernel queues connections from here on; they are handed out only
     // once listen() is called.
-    server->pauseAccepting();
     connect(server, &ConnectionRequestServer::connectionRequested, this,
             &QtSocketMember::handleConnectionRequest);
-    connect(server, &QTcpServer::acceptError, this, &QtSocketMember::handleAcceptError);
+    connect(server, &ConnectionRequestServer::acceptFailed, this, &QtSocketMember::handleAcceptFailure);
     m_server = server;
     m_localPort = server->serverPort();
     m_state = StateOpen;
@@ -188,7 +189,7 @@ bool QtSocketMember::listen()
     if (!m_server)
         return fail(SocketErrorNumber::kInvalidArgument,
                     QStringLiteral("Cannot listen: the socket is in use (state %1)").arg(m_state));
-    m_server->resumeAccepting();
+    m_server->setAccepting(true);
     m_state = StateListening;
     return true;
 }
@@ -343,10 +344,16 @@ void QtSocketMember::handleConnectionRequest(qintptr descriptor)
         ::close(int(descriptor));
 }
 
-void QtSocketMember::handleAcceptError(QAbstractSocket::SocketError error)
+void QtSocketMember::handleAcceptFailure(int errorNumber)
 {
-    reportError(describeSocketError(error, SocketActivity::Listening, QString(), localPort(),
-                                    m_server ? m_server->errorString() : QString()));
+    // Reported as the control's out-of-memory error, which leaves the
+    // listening socket open: the acceptor resumes by itself once
+    // descriptors are free, while the Windows-sockets numbers for these
+    // failures would make the session close it.
+    reportError({ SocketErrorNumber::kOutOfResources,
+                  QStringLiteral("Cannot accept connections on port %1: %2; waiting clients are turned away for now")
+                      .arg(localPort())
+                      .arg(QString::fromLocal8Bit(std::strerror(errorNumber))) });
 }
 
 bool QtSocketMember::sendData(const QByteArray &bytes)
@@ -396,6 +403,19 @@ qint64 QtSocketMember::bytesToWrite() const
     return m_tcp ? m_tcp->bytesToWrite() : 0;
 }
 
+qint64 QtSocketMember::bytesHeldBack() const
+{
+    if (m_protocol == Udp)
+        return m_waitingBytes;
+    if (!m_tcp || m_tcp->bytesToWrite() == 0)
+        return 0;
+    // Bytes that the kernel would take have simply not been written yet.
+    pollfd writable { int(m_tcp->socketDescriptor()), POLLOUT, 0 };
+    if (::poll(&writable, 1, 0) > 0 && (writable.revents & POLLOUT))
+        return 0;
+    return m_tcp->bytesToWrite();
+}
+
 void QtSocketMember::setReadBufferSize(qint64 bytes)
 {
     m_readBufferSize = qMax<qint64>(0, bytes);
@@ -407,6 +427,15 @@ void QtSocketMember::close()
 {
     releaseTransport();
     m_state = StateClosed;
+}
+
+void QtSocketMember::abort()
+{
+    if (QTcpSocket *socket = m_tcp) {
+        socket->disconnect(this);
+        socket->abort();
+    }
+    close();
 }
 
 int QtSocketMember::lastError() const
@@ -430,6 +459,7 @@ void QtSocketMember::releaseTransport()
     if (ConnectionRequestServer *server = m_server) {
         m_server = nullptr;
         server->disconnect(this);
+        server->setAccepting(false);
         server->close();
         server->deleteLater();
     }

@@ -67,8 +67,10 @@ public:
     QByteArray getData(qint64 maxBytes = -1) override;
     qint64 bytesAvailable() const override;
     qint64 bytesToWrite() const override;
+    qint64 bytesHeldBack() const override;
     void setReadBufferSize(qint64 bytes) override;
     void close() override;
+    void abort() override;
 
     int lastError() const override;
     QString errorString() const override;
@@ -79,7 +81,7 @@ private:
     void handleTcpDisconnected();
     void handleTcpStateChanged(QAbstractSocket::SocketState socketState);
     void handleConnectionRequest(qintptr descriptor);
-    void handleAcceptError(QAbstractSocket::SocketError error);
+    void handleAcceptFailure(int errorNumber);
     void handleUdpReadyRead();
     void handleUdpError(QAbstractSocket::SocketError error);
 

@@ -5,9 +5,12 @@
 
 // Error numbers a socket member reports besides those the session compares
 // (SocketMember::ErrorNumber). They follow the Windows-sockets numbering so
-// every failure reads the same way in the error log, and all lie above
-// 10000, so the session closes the connection on any of them.
+// every failure reads the same way in the error log, and all but the first
+// lie above 10000, so the session closes the connection on any of them.
 namespace SocketErrorNumber {
+// The control's out-of-memory error: below 10000, so the session keeps the
+// member (a listening socket that runs out of descriptors goes on listening).
+inline constexpr int kOutOfResources = 7;
 inline constexpr int kAccessDenied = 10013;      // WSAEACCES: e.g. a port below 1024
 inline constexpr int kInvalidArgument = 10022;   // WSAEINVAL: bad value, unknown request id
 inline constexpr int kAlreadyInProgress = 10037; // WSAEALREADY: connect while connecting
@@ -30,7 +33,7 @@ struct SocketFailure
 // causes into one error code; the activity tells them apart (a network
 // error while connecting means the host is unreachable, once connected it
 // means the connection was aborted).
-enum class SocketActivity { Connecting, Connected, Binding, Listening, Datagram };
+enum class SocketActivity { Connecting, Connected, Binding, Datagram };
 
 // Number and user-facing description of a Qt socket error. host and port
 // name the other end (or the local address when binding); qtText is Qt's

@@ -61,11 +61,17 @@ public:
     virtual qint64 bytesAvailable() const = 0;
     // Bytes queued for sending that the kernel has not taken yet.
     virtual qint64 bytesToWrite() const = 0;
+    // The part of bytesToWrite() that waits because the peer takes nothing
+    // more (TCP: the kernel's send buffer is full); 0 while it keeps up.
+    virtual qint64 bytesHeldBack() const = 0;
     // Caps how much the member reads from the kernel ahead of getData(), so
     // unread data stays in the kernel and TCP flow control holds the sender.
     virtual void setReadBufferSize(qint64 bytes) = 0;
     // Closes locally; raises no closed() signal.
     virtual void close() = 0;
+    // Closes at once and drops what is still queued for the peer; raises no
+    // closed() signal.
+    virtual void abort() = 0;
 
     virtual int lastError() const = 0;
     virtual QString errorString() const = 0;

@@ -1,11 +1,11 @@
 #include "ErrorLog.h"
 
+#include "ErrorProgram.h"
 #include "config/GlobalOptions.h"
 #include "config/ProgramFolder.h"
 
 #include <QFile>
 #include <QLocale>
-#include <QProcess>
 
 #include <cerrno>
 #include <fcntl.h>
@@ -54,15 +54,6 @@ void appendLine(const QString &path, const QByteArray &line)
     ::close(fd);
 }
 
-void startErrorProgram(const QString &commandLine)
-{
-    const QStringList words = QProcess::splitCommand(commandLine);
-    if (words.isEmpty())
-        return;
-    // No shell and no waiting; a program that is missing just does not run.
-    QProcess::startDetached(words.first(), words.mid(1));
-}
-
 } // namespace
 
 QString errorLogLine(const ErrorLogContext &context, const QString &message,
@@ -88,10 +79,18 @@ QString errorLogLine(const ErrorLogContext &context, const QString &message,
 void writeErrorLogLine(const ErrorLogContext &context, const QString &message,
                        const GlobalOptions &options, const QDateTime &now)
 {
+    const bool runsProgram = !options.OnErrorRunApp.isEmpty();
     if (options.LogErrors != 0) {
+        QString text = message;
+        // The first line once a copy may start again tells how many did not.
+        if (runsProgram && errorProgramHasRoom()) {
+            if (const qint64 skipped = takeSkippedErrorProgramStarts())
+                text += QStringLiteral("; %1 error-program starts skipped").arg(skipped);
+        }
         appendLine(programFolderFile(QStringLiteral("errorlog.txt")),
-                   (errorLogLine(context, message, now) + QStringLiteral("\r\n")).toUtf8());
+                   (errorLogLine(context, text, now) + QStringLiteral("\r\n")).toUtf8());
     }
-    if (!options.OnErrorRunApp.isEmpty())
+    // After the line: the program may read it.
+    if (runsProgram)
         startErrorProgram(options.OnErrorRunApp);
 }

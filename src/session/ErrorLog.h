@@ -24,9 +24,10 @@ QString errorLogLine(const ErrorLogContext &context, const QString &message,
 
 // Records one event: appends its line to errorlog.txt in the program folder
 // when options.LogErrors is set, and, independently, starts
-// options.OnErrorRunApp when one is configured. Never fails towards the
-// caller: a log that cannot be written and a program that cannot be started
-// are passed over.
+// options.OnErrorRunApp when one is configured (a few copies at a time, see
+// ErrorProgram.h; the line says how many starts were skipped before it).
+// Never fails towards the caller: a log that cannot be written and a program
+// that cannot be started are passed over.
 void writeErrorLogLine(const ErrorLogContext &context, const QString &message,
                        const GlobalOptions &options,
                        const QDateTime &now = QDateTime::currentDateTime());

@@ -32,29 +32,57 @@ bool SessionEngine::anyConnected() const
     return false;
 }
 
-void SessionEngine::SendToClients(const QByteArray &block)
+// The members that get serial data: the connected ones, or only the first
+// of them with "first client only".
+QList<int> SessionEngine::serialReceivers() const
 {
     const bool firstOnly = isServer() && m_record.ServerSerialOptions == 2;
+    QList<int> receivers;
     for (int i = 0; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
-        SocketMember *member = m_sockets[size_t(i)];
-        if (member->state() != SocketMember::StateConnected)
+        if (m_sockets[size_t(i)]->state() != SocketMember::StateConnected)
             continue;
-        member->sendData(block);
+        receivers << i;
         if (firstOnly)
             break;
     }
+    return receivers;
 }
 
-qint32 SessionEngine::serialReadRoom() const
+void SessionEngine::SendToClients(const QByteArray &block)
 {
-    // A peer that does not read must not make memory grow: while one has more
-    // queued than a whole buffer, the serial side waits (its flow control or
-    // the writing application is held back instead).
-    for (int i = 0; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
-        if (m_sockets[size_t(i)]->bytesToWrite() > m_myBuffer.capacity())
-            return 0;
+    for (const int i : serialReceivers())
+        m_sockets[size_t(i)]->sendData(block);
+}
+
+qint32 SessionEngine::serialReadRoom()
+{
+    // Memory stays bounded: the clients' queues together hold at most two
+    // buffers, each client its share of them and never more than one
+    // buffer. A client further behind than its share while the kernel takes
+    // nothing more from it is not reading. While another client keeps up,
+    // such a client is let go rather than hold up the others; when none
+    // keeps up, or the queues are full, the serial side waits (its flow
+    // control or the writing application is held back instead).
+    const QList<int> receivers = m_record.UseUDP ? QList<int> { 0 } : serialReceivers();
+    if (receivers.isEmpty())
+        return m_myBuffer.freeSpace();
+    const qint64 capacity = m_myBuffer.capacity();
+    const qint64 share = qMin(capacity, 2 * capacity / receivers.size());
+    qint64 queued = 0;
+    QList<int> notReading;
+    for (const int i : receivers) {
+        const SocketMember *member = m_sockets[size_t(i)];
+        const qint64 bytes = member->bytesToWrite();
+        if (bytes > share && member->bytesHeldBack() > share)
+            notReading << i;
+        else
+            queued += bytes;
     }
-    return m_myBuffer.freeSpace();
+    if (notReading.size() == receivers.size())
+        return 0;
+    for (const int i : std::as_const(notReading))
+        dropClientNotReading(i);
+    return queued < 2 * capacity ? m_myBuffer.freeSpace() : 0;
 }
 
 void SessionEngine::sendHeldData(bool packetMode, bool mayHold)

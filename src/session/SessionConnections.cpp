@@ -23,13 +23,18 @@ void SessionEngine::wireSocket(SocketMember *member)
     connect(member, &SocketMember::connectionRequested, this, &SessionEngine::ConnectionRequest);
     connect(member, &SocketMember::closed, this, &SessionEngine::handlePeerClose);
     connect(member, &SocketMember::errorOccurred, this, &SessionEngine::handleSocketError);
-    // A peer that catches up lets held serial input be read again at once.
-    // Only then: every client reports every write, and checking the room
-    // asks every client, which with a thousand clients is a million calls
-    // for each block sent.
+    // A peer that catches up lets held serial input be read again. Only
+    // then, and once for all the writes that one pass of the event loop
+    // reports: checking the room asks every client, which with a thousand
+    // clients would be a million calls for each block sent.
     connect(member, &SocketMember::bytesWritten, this, [this](int, qint64) {
-        if (m_serialInputHeld)
+        if (!m_serialInputHeld || m_resumeQueued)
+            return;
+        m_resumeQueued = true;
+        QMetaObject::invokeMethod(this, [this] {
+            m_resumeQueued = false;
             resumeSerialReading();
+        }, Qt::QueuedConnection);
     });
     member->setReadBufferSize(kSocketReadAhead);
 }
@@ -138,6 +143,15 @@ void SessionEngine::handleClose(int index)
         m_timer1.start();
     }
     m_closingNow = false;
+}
+
+void SessionEngine::dropClientNotReading(int index)
+{
+    SocketMember *member = socket(index);
+    LogErrors(QStringLiteral("Client %1 disconnected: not reading").arg(member->remoteHostIP()));
+    // Its queue goes with it: that is the memory to free.
+    member->abort();
+    handleClose(index);
 }
 
 void SessionEngine::handleSocketError(int index, int number, const QString &description)

@@ -150,7 +150,8 @@ private:
     void SerialReceive();
     void VirtualReceive();
     void VirtualOpenClose(bool opened);
-    qint32 serialReadRoom() const;
+    QList<int> serialReceivers() const;
+    qint32 serialReadRoom();
     bool serialInputIgnored() const;
     void moveSerialInput(const std::function<qint64()> &pending,
                          const std::function<QByteArray(qint32)> &read, bool mayHold);
@@ -173,6 +174,7 @@ private:
     void handlePeerClose(int index);
     void finishCloseIfDrained(int index);
     void handleSocketError(int index, int number, const QString &description);
+    void dropClientNotReading(int index);
     void wireSocket(SocketMember *member);
     bool anyConnected() const;
     bool isServer() const { return m_record.TCPOption == 1; }
@@ -207,6 +209,7 @@ private:
     bool m_inSerialReceive = false;
     // Serial input waits for room: a client's queue or the hold buffer is full.
     bool m_serialInputHeld = false;
+    bool m_resumeQueued = false;
     bool m_draining = false;
     int m_pingsInFlight = 0;
     // Counts the connections each member has carried, so a late answer can

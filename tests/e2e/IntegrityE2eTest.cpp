@@ -2,6 +2,7 @@
 // in order, in both directions, and nothing a client sent before closing is
 // lost.
 #include "E2eSupport.h"
+#include "ProcessProbe.h"
 #include "PtyServerRun.h"
 #include "RawStreams.h"
 
@@ -36,9 +37,10 @@ QByteArray everyByteValue()
 
 // The session counts a client only after accepting it; serial bytes sent
 // before that are dropped by design.
-::testing::AssertionResult connectAndWaitCounted(PtyServerRun &run, int *fd, int expectedCount)
+::testing::AssertionResult connectAndWaitCounted(PtyServerRun &run, int *fd, int expectedCount,
+                                                 int receiveBufferSize = 0)
 {
-    *fd = connectTcp(run.port);
+    *fd = connectTcp(run.port, receiveBufferSize);
     if (*fd < 0)
         return ::testing::AssertionFailure() << "connection refused";
     const QString counted = QStringLiteral("TCP/IP Status: Connected (%1)").arg(expectedCount);
@@ -128,4 +130,35 @@ TEST(IntegrityE2e, ClientThatWritesAndClosesAtOnceLosesNoByte)
         EXPECT_TRUE(readFromFd(run.device.masterFd(), 1, 200).isEmpty());
         EXPECT_TRUE(run.velloca.isRunning());
     }
+}
+
+// Clients that do not read while another does: they are let go rather than
+// hold up the reader, and their queues together stay within two buffers.
+TEST(IntegrityE2e, ClientsThatDoNotReadAreLetGoWhileAnotherReadsAndMemoryStaysBounded)
+{
+    PtyServerRun run;
+    const qint64 buffer = 4 * 1024 * 1024;
+    ASSERT_TRUE(run.start(QStringLiteral("BufferSize=11\r\n")));
+    int reader = -1;
+    ASSERT_TRUE(connectAndWaitCounted(run, &reader, 1));
+    const int notReading = 8;
+    QList<int> idle;
+    for (int i = 0; i < notReading; ++i) {
+        // A small window, so the kernel takes in little of what they do not read.
+        ASSERT_TRUE(connectAndWaitCounted(run, &idle.emplace_back(), i + 2, 4096));
+    }
+    const qint64 pid = run.velloca.processId();
+    const qint64 residentBefore = residentKiB(pid);
+
+    const QByteArray stream = randomBytes(16 * 1024 * 1024, 31);
+    const Exchange result = exchange(run.device.masterFd(), stream, 0, reader, {}, stream.size(), 30000);
+    EXPECT_EQ(sha256(result.atSecond), sha256(stream)) << result.atSecond.size() << " bytes arrived";
+    EXPECT_EQ(run.velloca.errorLog().count(QStringLiteral("disconnected: not reading")), notReading)
+        << qPrintable(run.velloca.errorLog());
+    // The queues may hold two buffers; the hold buffer, once touched, one.
+    const qint64 grownKiB = peakResidentKiB(pid) - residentBefore;
+    EXPECT_LT(grownKiB * 1024, 4 * buffer) << "grew by " << grownKiB << " KiB";
+    for (const int fd : std::as_const(idle))
+        ::close(fd);
+    ::close(reader);
 }

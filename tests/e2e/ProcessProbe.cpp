@@ -15,6 +15,16 @@ QByteArray procFile(qint64 pid, const char *name)
     return file.open(QIODevice::ReadOnly) ? file.readAll() : QByteArray();
 }
 
+qint64 statusKiB(qint64 pid, const QByteArray &field)
+{
+    const QList<QByteArray> lines = procFile(pid, "status").split('\n');
+    for (const QByteArray &line : lines) {
+        if (line.startsWith(field))
+            return line.mid(field.size()).trimmed().split(' ').first().toLongLong();
+    }
+    return -1;
+}
+
 } // namespace
 
 int openDescriptorCount(qint64 pid)
@@ -43,12 +53,12 @@ qint64 cpuTimeMs(qint64 pid)
 
 qint64 residentKiB(qint64 pid)
 {
-    const QList<QByteArray> lines = procFile(pid, "status").split('\n');
-    for (const QByteArray &line : lines) {
-        if (line.startsWith("VmRSS:"))
-            return line.mid(6).trimmed().split(' ').first().toLongLong();
-    }
-    return -1;
+    return statusKiB(pid, "VmRSS:");
+}
+
+qint64 peakResidentKiB(qint64 pid)
+{
+    return statusKiB(pid, "VmHWM:");
 }
 
 } // namespace e2e

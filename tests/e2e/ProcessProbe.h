@@ -12,5 +12,7 @@ int openDescriptorCount(qint64 pid);
 qint64 cpuTimeMs(qint64 pid);
 // Resident memory (VmRSS) in KiB.
 qint64 residentKiB(qint64 pid);
+// The most resident memory so far (VmHWM) in KiB.
+qint64 peakResidentKiB(qint64 pid);
 
 } // namespace e2e

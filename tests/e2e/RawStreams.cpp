@@ -14,13 +14,15 @@
 
 namespace e2e {
 
-int connectTcp(quint16 port)
+int connectTcp(quint16 port, int receiveBufferSize)
 {
     // Writing on after the program closed its end must fail, not kill the test.
     ::signal(SIGPIPE, SIG_IGN);
     const int fd = ::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
     if (fd < 0)
         return -1;
+    if (receiveBufferSize > 0)
+        ::setsockopt(fd, SOL_SOCKET, SO_RCVBUF, &receiveBufferSize, sizeof receiveBufferSize);
     sockaddr_in address {};
     address.sin_family = AF_INET;
     address.sin_port = htons(port);

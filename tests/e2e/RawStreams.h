@@ -8,8 +8,9 @@
 // driven from one loop without an event loop in between).
 namespace e2e {
 
-// A non-blocking TCP connection to 127.0.0.1:port; -1 when refused.
-int connectTcp(quint16 port);
+// A non-blocking TCP connection to 127.0.0.1:port; -1 when refused. A
+// receive buffer size caps how much the kernel takes in for the test.
+int connectTcp(quint16 port, int receiveBufferSize = 0);
 // Closes with SO_LINGER 0, so the peer gets a reset instead of a FIN.
 void resetConnection(int fd);
 

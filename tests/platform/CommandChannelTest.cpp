@@ -1,4 +1,6 @@
 #include "platform/CommandChannel.h"
+#include "platform/CommandConnection.h"
+#include "support/FdIo.h"
 #include "support/Wait.h"
 
 #include <QDir>
@@ -10,6 +12,7 @@
 #include <gtest/gtest.h>
 
 #include <memory>
+#include <fcntl.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/un.h>
@@ -77,21 +80,27 @@ mode_t modeOf(const QString &path)
     return info.st_mode;
 }
 
-// A socket file whose program is gone: bound, never listened on, closed.
-void leaveStaleSocket(const QString &path)
+sockaddr_un localAddress(const QString &path)
 {
-    const int fd = ::socket(AF_UNIX, SOCK_STREAM, 0);
     sockaddr_un address {};
     address.sun_family = AF_UNIX;
     const QByteArray encoded = QFile::encodeName(path);
     std::memcpy(address.sun_path, encoded.constData(), size_t(encoded.size()));
+    return address;
+}
+
+// A socket file whose program is gone: bound, never listened on, closed.
+void leaveStaleSocket(const QString &path)
+{
+    const int fd = ::socket(AF_UNIX, SOCK_STREAM, 0);
+    const sockaddr_un address = localAddress(path);
     ASSERT_EQ(::bind(fd, reinterpret_cast<const sockaddr *>(&address), sizeof address), 0);
     ::close(fd);
 }
 
 int openSockets(const CommandChannel &channel)
 {
-    return int(channel.findChildren<QLocalSocket *>().size());
+    return int(channel.findChildren<CommandConnection *>().size());
 }
 
 } // namespace
@@ -221,7 +230,7 @@ TEST(CommandChannelTest, KeepsMemoryBoundedWhileTheHandlerIsBusy)
     Client client(channel.socketPath());
     ASSERT_TRUE(client.connected());
     ASSERT_TRUE(waitUntil([&] { return openSockets(channel) == 1; }));
-    QLocalSocket *serverSide = channel.findChildren<QLocalSocket *>().first();
+    CommandConnection *serverSide = channel.findChildren<CommandConnection *>().first();
     qint64 handedToKernel = 0;
     QObject::connect(&client.socket, &QLocalSocket::bytesWritten, [&](qint64 bytes) { handedToKernel += bytes; });
 
@@ -312,13 +321,37 @@ TEST(CommandChannelTest, ReleasesConnectionsThatGoAway)
     auto leaving = std::make_unique<Client>(channel.socketPath());
     recorder.decide = [&](const QString &, const QString &command) {
         if (command == QLatin1String("[leave]")) {
-            const QPointer<QLocalSocket> serverSide = channel.findChildren<QLocalSocket *>().first();
+            const QPointer<CommandConnection> serverSide = channel.findChildren<CommandConnection *>().first();
             leaving.reset();
-            EXPECT_TRUE(waitUntil([&] { return !serverSide || serverSide->state() == QLocalSocket::UnconnectedState; }));
+            EXPECT_TRUE(waitUntil([&] { return !serverSide || serverSide->inputEnded(); }));
         }
         return true;
     };
     leaving->send("T\t[leave]\nT\t[after]\n");
     EXPECT_TRUE(waitUntil([&] { return recorder.calls.size() == 22; }));
     EXPECT_TRUE(waitUntil([&] { return openSockets(channel) == before && channel.connectionCount() == 0; }));
+}
+
+// As `printf 'T\t[ok1]\n' | socat - UNIX-CONNECT:…` does: send, shut down the
+// sending side, read the replies.
+TEST(CommandChannelTest, AnswersEveryLineOfAClientThatShutsDownItsSendingSide)
+{
+    QTemporaryDir temporary;
+    Recorder recorder;
+    CommandChannel channel(recorder.handler());
+    ASSERT_TRUE(channel.listen(temporary.path()));
+
+    const int client = ::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+    const sockaddr_un address = localAddress(channel.socketPath());
+    ASSERT_EQ(::connect(client, reinterpret_cast<const sockaddr *>(&address), sizeof address), 0);
+    const QByteArray requests = "T\t[ok1]\nT\t[no]\nT\t[ok cut";
+    ASSERT_EQ(::write(client, requests.constData(), size_t(requests.size())), requests.size());
+    ASSERT_EQ(::shutdown(client, SHUT_WR), 0);
+    ::fcntl(client, F_SETFL, O_NONBLOCK);
+    EXPECT_EQ(readFromFd(client, 17), "accepted\nrefused\n");
+    char byte = 0;
+    EXPECT_TRUE(waitUntil([&] { return ::read(client, &byte, 1) == 0; })) << "not closed after the replies";
+    ::close(client);
+    EXPECT_EQ(recorder.calls, QList<Call>({ { "T", "[ok1]" }, { "T", "[no]" } }));
+    EXPECT_TRUE(waitUntil([&] { return channel.connectionCount() == 0; }));
 }

@@ -1,6 +1,7 @@
 #include "config/GlobalOptions.h"
 #include "config/ProgramFolder.h"
 #include "session/ErrorLog.h"
+#include "session/ErrorProgram.h"
 #include "support/Wait.h"
 
 #include <QDir>
@@ -178,6 +179,45 @@ TEST_F(ErrorLogTest, ErrorProgramStartsOnEveryCall)
     EXPECT_TRUE(waitUntil([&] { return fileContents(marker) == "alarm\nalarm\n"; }))
         << fileContents(marker).toStdString();
     EXPECT_FALSE(QFile::exists(logPath()));
+
+    // A path with a blank, unquoted as a file dialog gives it, runs as it is.
+    ASSERT_TRUE(QDir(m_folder.path()).mkdir(QStringLiteral("my tools")));
+    options.OnErrorRunApp = m_folder.filePath(QStringLiteral("my tools/alarm.sh"));
+    ASSERT_TRUE(writeScript(options.OnErrorRunApp, "#!/bin/sh\necho ran > \"$0.ran\"\n"));
+    writeErrorLogLine(clientContext(), QStringLiteral("three"), options, kMoment);
+    EXPECT_TRUE(waitUntil([&] { return fileContents(options.OnErrorRunApp + ".ran") == "ran\n"; }));
+}
+
+TEST_F(ErrorLogTest, FloodRunsAtMostFourCopiesAndLogsTheSkippedStarts)
+{
+    // Each copy notes its start, runs until the release file appears, then
+    // notes its end.
+    const QString script = m_folder.filePath(QStringLiteral("slow.sh"));
+    ASSERT_TRUE(writeScript(script, "#!/bin/sh\necho + >> \"$1\"\n"
+                                    "while [ ! -e \"$2\" ]; do sleep 0.1; done\necho - >> \"$1\"\n"));
+    const QString marker = m_folder.filePath(QStringLiteral("copies.txt"));
+    const QString release = m_folder.filePath(QStringLiteral("release"));
+    GlobalOptions options;
+    options.LogErrors = 1;
+    options.OnErrorRunApp = QStringLiteral("\"%1\" \"%2\" \"%3\"").arg(script, marker, release);
+
+    // Returns at once although no copy ends by itself.
+    for (int i = 0; i < 40; ++i)
+        writeErrorLogLine(clientContext(), QStringLiteral("flood"), options, kMoment);
+    ASSERT_TRUE(waitUntil([&] { return fileContents(marker).count('+') >= 4; }));
+    QFile(release).open(QIODevice::WriteOnly);
+    ASSERT_TRUE(waitUntil([&] {
+        const QByteArray copies = fileContents(marker);
+        return copies.count('-') == copies.count('+') && errorProgramHasRoom();
+    }));
+    EXPECT_EQ(fileContents(marker), "+\n+\n+\n+\n-\n-\n-\n-\n");
+
+    writeErrorLogLine(clientContext(), QStringLiteral("after"), options, kMoment);
+    EXPECT_TRUE(waitUntil([&] { return fileContents(marker).count('-') == 5; }));
+    const QList<QByteArray> lines = fileContents(logPath()).split('\n');
+    ASSERT_EQ(lines.size(), 42);
+    EXPECT_TRUE(lines[40].startsWith("Velloca Error: after; 36 error-program starts skipped, ")) << lines[40].constData();
+    EXPECT_EQ(fileContents(logPath()).count("skipped"), 1);
 }
 
 TEST_F(ErrorLogTest, FullDiskLosesOnlyTheLinesThatDoNotFit)
