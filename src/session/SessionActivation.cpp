@@ -84,7 +84,7 @@ void SessionEngine::deactivate()
     socket(0)->setProtocol(SocketMember::Tcp);
     setStatusLine(NetworkLine, composeStatus(kNetworkCaption, 5100));
     setSettingsLocked(false);
-    setActivateCaption(LoadResString(5087));
+    setActivity(Activity::Inactive);
 }
 
 void SessionEngine::activate()
@@ -170,7 +170,7 @@ void SessionEngine::activate()
     if (m_settings.SessionDescription.isEmpty())
         setCaption(m_settings.ConnectorText + QStringLiteral(" - ") + LoadResString(5120));
     setSettingsLocked(true);
-    setActivateCaption(LoadResString(5118));
+    setActivity(Activity::Active);
 }
 
 bool SessionEngine::openPhysicalPort()

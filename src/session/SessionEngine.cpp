@@ -118,17 +118,15 @@ void SessionEngine::setCommandTopic(const QString &topic)
     Q_EMIT commandTopicChanged(topic);
 }
 
-void SessionEngine::setActivateCaption(const QString &caption)
+void SessionEngine::setActivity(Activity activity)
 {
+    m_activity = activity;
+    // The button offers the opposite of the state.
+    const QString caption = LoadResString(activity == Activity::Active ? 5118 : 5087);
     if (m_activateCaption == caption)
         return;
     m_activateCaption = caption;
     Q_EMIT activateCaptionChanged(caption);
-}
-
-bool SessionEngine::isActive() const
-{
-    return m_activateCaption == LoadResString(5118);
 }
 
 void SessionEngine::setSettingsLocked(bool locked)

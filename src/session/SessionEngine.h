@@ -56,11 +56,12 @@ public:
     QString commandTopic() const { return m_commandTopic; }
     void setCommandTopic(const QString &topic);
 
-    // The Activate button's caption: the session is active exactly while it
-    // reads "De-Activate".
+    enum class Activity { Inactive, Active };
+    Activity activity() const { return m_activity; }
+    bool isActive() const { return m_activity == Activity::Active; }
+    // The Activate button's caption, which follows the activity: "Activate"
+    // while inactive, "De-Activate" while active.
     QString activateCaption() const { return m_activateCaption; }
-    void setActivateCaption(const QString &caption);
-    bool isActive() const;
     bool settingsLocked() const { return m_settingsLocked; }
     void setSettingsLocked(bool locked);
 
@@ -136,6 +137,7 @@ private:
     void takeLocalAddress();
 
     // Activation and deactivation.
+    void setActivity(Activity activity);
     void activate();
     void deactivate();
     bool openPhysicalPort();
@@ -197,6 +199,7 @@ private:
     QString m_caption;
     QString m_commandTopic;
     QString m_activateCaption;
+    Activity m_activity = Activity::Inactive;
     bool m_settingsLocked = false;
 
     SessionBuffer m_myBuffer;

@@ -208,10 +208,6 @@ TEST_F(SessionWindowTest, StatusLinesAndLockFollowTheEngine)
     EXPECT_EQ(label("StatusBar1_1"), QStringLiteral("TCP/IP Status: Listening..."));
     EXPECT_EQ(changes.count(), 1) << "an unchanged text is no change";
 
-    engine.setActivateCaption(QStringLiteral("De-Activate"));
-    EXPECT_TRUE(engine.isActive());
-    EXPECT_EQ(child<QAbstractButton>("Command1")->text(), QStringLiteral("De-Activate"));
-
     engine.setSettingsLocked(true);
     for (const char *locked : { "Combo2", "Combo1_0", "Combo1_5", "Command2", "TCPOption_0", "TCPOption_1",
                                 "IPAddress", "PortNumber", "LocalIP", "chkVPort", "chkUDP" })
