@@ -139,7 +139,7 @@ TEST_F(SessionWindowTest, PortAbove65535WarnsOnEveryKeystrokeButKeepsTheText)
     EXPECT_TRUE(messages.isEmpty());
     QTest::keyClicks(port, QStringLiteral("0"));
     ASSERT_EQ(messages.size(), 1);
-    EXPECT_EQ(messages[0].text, QStringLiteral("Port numbers must range between 0 and 65565"));
+    EXPECT_EQ(messages[0].text, QStringLiteral("Port numbers must range between 0 and 65535"));
     EXPECT_EQ(messages[0].title, QStringLiteral("Error"));
     QTest::keyClicks(port, QStringLiteral("1"));
     EXPECT_EQ(messages.size(), 2);
