@@ -89,7 +89,8 @@ void SessionEngine::deactivate()
 
 void SessionEngine::activate()
 {
-    if (m_settings.IPAddress.isEmpty()) {
+    // Only a client has a remote host; a server's field is hidden and unused.
+    if (m_settings.TCPOption == 0 && m_settings.IPAddress.isEmpty()) {
         setStatusLine(NetworkLine, composeStatus(kNetworkCaption, 5088));
         return;
     }

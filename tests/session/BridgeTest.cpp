@@ -191,6 +191,10 @@ TEST_F(BridgeTest, ActivationRefusalsTouchNothing)
     engine->Command1_Click();
     EXPECT_EQ(engine->statusLine(SessionEngine::NetworkLine), QStringLiteral("TCP/IP Status: Error - Invalid IP Address"));
     EXPECT_FALSE(engine->isActive());
+    // A server has no remote host: its hidden field does not matter.
+    activateServer();
+    engine->Command1_Click();
+    engine->settings().TCPOption = 0;
 
     engine->settings().IPAddress = QStringLiteral("127.0.0.1");
     for (const char *bad : { "65536", "-1" }) {
