@@ -195,12 +195,13 @@ bool SessionEngine::openPhysicalPort()
     m_serialPort->setOutBufferSize(kSerialQueueSize);
     if (!sizeBuffers())
         return false;
-    if (!m_serialPort->open()) {
-        failSerialOpen(m_serialPort->errorString());
-        return false;
-    }
-    if (!m_serialPort->isOpen()) {
-        setStatusLine(ComLine, composeStatus(kComCaption, 5095));
+    if (!m_serialPort->open() || !m_serialPort->isOpen()) {
+        // "Port not available" stays the words scripts look for; the
+        // reason follows in parentheses.
+        const QString reason = m_serialPort->errorString();
+        m_serialPort->close();
+        setStatusLine(ComLine, composeStatus(kComCaption, 5095)
+                                   + (reason.isEmpty() ? QString() : QStringLiteral(" (%1)").arg(reason)));
         return false;
     }
     setStatusLine(ComLine, composeStatus(kComCaption, 5096));
