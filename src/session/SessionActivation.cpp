@@ -107,6 +107,11 @@ void SessionEngine::activate()
         setStatusLine(NetworkLine, LoadResString(kNetworkCaption));
         return;
     }
+    if (m_record.ComPortNumber < 0 || m_record.ComPortNumber >= SessionLists::kConnectorCount) {
+        setStatusLine(ComLine, composeStatus(kComCaption, 5095)
+                                   + QStringLiteral(" (\"%1\" names no connector)").arg(m_settings.ConnectorText));
+        return;
+    }
 
     const QString portName = QStringLiteral("COM%1").arg(m_record.ComPortNumber);
     if (m_settings.CreateVirtualPort == 1) {

@@ -213,6 +213,16 @@ TEST_F(BridgeTest, ActivationRefusalsTouchNothing)
     EXPECT_EQ(engine->statusLine(SessionEngine::NetworkLine), QStringLiteral("TCP/IP Status:"));
     EXPECT_FALSE(engine->isActive());
 
+    // Typed text that names no connector creates nothing.
+    engine->settings().Connector = -1;
+    engine->settings().ConnectorText = QStringLiteral("my port");
+    engine->settings().CreateVirtualPort = 1;
+    engine->Command1_Click();
+    EXPECT_EQ(engine->statusLine(SessionEngine::ComLine),
+              QStringLiteral("COM Status: Error - Port not available (\"my port\" names no connector)"));
+    EXPECT_FALSE(engine->isActive());
+    engine->settings().CreateVirtualPort = 0;
+
     // A device that does not exist: the reason is on the COM line.
     engine->settings().Connector = 9;
     const QString device = folder.filePath(QStringLiteral("ttyUSB9"));
