@@ -34,8 +34,9 @@ class QUdpSocket;
 //   the peer counts as a close: Qt does not tell the two apart.
 // - UDP: getData() returns the next whole datagram whatever maxBytes says;
 //   bytesAvailable() is the size of the next datagram. sendData() goes to
-//   RemoteHost:RemotePort; with no RemoteHost (or RemotePort 0) it answers
-//   the sender of the last datagram received. A host name is looked up once
+//   RemoteHost:RemotePort; with no RemoteHost it answers the sender of the
+//   last datagram received, at the address and port that datagram came
+//   from (RemotePort 0 takes that port too). A host name is looked up once
 //   per RemoteHost text; datagrams sent meanwhile wait for the answer and are
 //   dropped (with lastError() set) if the name does not resolve.
 // - Failures inside a call return false and set lastError(); they never also

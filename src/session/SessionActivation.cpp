@@ -162,6 +162,8 @@ void SessionEngine::activate()
         }
     } else {
         m_record.TCPOption = 1;
+        // A server answers whoever sent last, never the client role's host.
+        member->setRemoteHost(QString());
         member->setLocalPort(portValue);
         if (m_record.UseUDP)
             member->setRemotePort(portValue);
