@@ -13,12 +13,12 @@
 
 namespace {
 
-constexpr int kDefaultPacketSize = 2000;
+constexpr int kNetworkCaption = 5091;
 
 qint32 packetSize()
 {
     const qint32 size = GlobalOptions::global().PacketSize;
-    return size >= 1 ? size : kDefaultPacketSize;
+    return size >= kMinPacketSize ? size : kDefaultPacketSize;
 }
 
 } // namespace
@@ -32,6 +32,13 @@ bool SessionEngine::anyConnected() const
     return false;
 }
 
+void SessionEngine::sendBlock(SocketMember *member, const QByteArray &block)
+{
+    // The block is lost for this peer: say so rather than drop it silently.
+    if (!member->sendData(block))
+        setStatusLine(NetworkLine, composeStatus(kNetworkCaption, 5099, member->errorString()));
+}
+
 void SessionEngine::SendToClients(const QByteArray &block)
 {
     const bool firstOnly = isServer() && m_record.ServerSerialOptions == 2;
@@ -39,7 +46,7 @@ void SessionEngine::SendToClients(const QByteArray &block)
         SocketMember *member = m_sockets[size_t(i)];
         if (member->state() != SocketMember::StateConnected)
             continue;
-        member->sendData(block);
+        sendBlock(member, block);
         if (firstOnly)
             break;
     }
@@ -64,11 +71,11 @@ void SessionEngine::sendHeldData(bool packetMode, bool mayHold)
         if (packetMode) {
             while (m_myBuffer.count() >= packetSize()) {
                 qint32 n = packetSize();
-                member->sendData(ReadFromMyBuffer(n));
+                sendBlock(member, ReadFromMyBuffer(n));
             }
         } else if (m_myBuffer.count() > 0) {
             qint32 n = -1;
-            member->sendData(ReadFromMyBuffer(n));
+            sendBlock(member, ReadFromMyBuffer(n));
         }
         return;
     }
@@ -173,7 +180,7 @@ void SessionEngine::flushOnTimeout()
     bool sent = false;
     if (m_record.UseUDP) {
         qint32 n = -1;
-        socket(0)->sendData(ReadFromMyBuffer(n));
+        sendBlock(socket(0), ReadFromMyBuffer(n));
         sent = true;
     } else if (anyConnected()) {
         qint32 n = -1;

@@ -89,6 +89,8 @@ public:
 
     // Sends one block to the connected members by the routing options.
     void SendToClients(const QByteArray &block);
+    // Sends one block on one member; a failed send shows on the TCP/IP line.
+    void sendBlock(SocketMember *member, const QByteArray &block);
     // Writes one line to the error log and starts the error program.
     void LogErrors(const QString &message);
 

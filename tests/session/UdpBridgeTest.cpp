@@ -1,5 +1,6 @@
 #include "BridgeFixture.h"
 
+#include <QFile>
 #include <QNetworkDatagram>
 #include <QUdpSocket>
 
@@ -68,6 +69,27 @@ TEST_F(UdpBridgeTest, ImmediateModeSendsWhatArrivedAndDatagramsReachTheSerialSid
     const QByteArray big = randomBytes(8000);
     peer.writeDatagram(big, QHostAddress::LocalHost, quint16(engine->socket(0)->localPort()));
     EXPECT_TRUE(pty.read(big.size()) == big);
+}
+
+} // namespace
+
+namespace {
+
+TEST_F(UdpBridgeTest, SendThatFailsIsShownAndLogged)
+{
+    GlobalOptions::global().LogErrors = 1;
+    GlobalOptions::global().PacketSize = 70000; // more than one datagram carries
+    engine->settings().WaitForCr = 1;
+    engine->settings().TimeoutValue = QStringLiteral("100000");
+    engine->settings().BufferSize = 6; // 131072 bytes
+    activateUdpServer();
+    ASSERT_TRUE(pty.write(randomBytes(70000)));
+    const QString failure = QStringLiteral("TCP/IP Status: Error - Datagram too large");
+    EXPECT_TRUE(waitUntil([&] { return engine->statusLine(SessionEngine::NetworkLine).startsWith(failure); }))
+        << engine->statusLine(SessionEngine::NetworkLine).toStdString();
+    QFile log(folder.filePath(QStringLiteral("errorlog.txt")));
+    ASSERT_TRUE(log.open(QIODevice::ReadOnly));
+    EXPECT_TRUE(QString::fromUtf8(log.readAll()).contains(failure));
 }
 
 } // namespace
