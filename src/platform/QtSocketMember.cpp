@@ -3,11 +3,11 @@
 #include "ConnectionRequestServer.h"
 #include "HostAddressText.h"
 #include "LocalAddresses.h"
+#include "TcpConnector.h"
 
 #include <QCoreApplication>
 #include <QHostInfo>
 #include <QNetworkProxy>
-#include <QScopedValueRollback>
 #include <QSet>
 #include <QTcpSocket>
 #include <QTimer>
@@ -20,6 +20,8 @@ namespace {
 // How long a locally closed connection may take to hand its queued bytes to
 // the peer before it is cut.
 constexpr int kLingerMs = 10000;
+// How long one address may take to answer a connection attempt.
+constexpr int kConnectTimeoutMs = 30000;
 
 // Connection requests announced but not yet taken over. A listening member
 // enters a descriptor before announcing it and closes it afterwards unless
@@ -221,16 +223,68 @@ bool QtSocketMember::connectToRemote()
 
     releaseTransport();
     m_peerAddress.clear();
-    QTcpSocket *socket = createTcpSocket();
-    m_state = literal.isNull() ? StateResolvingHost : StateConnecting;
-    // A loopback connection can succeed or be refused inside connectToHost();
-    // the outcome is still reported after this call returns.
-    QScopedValueRollback guard(m_inConnectCall, true);
-    const auto family = literal.protocol() == QAbstractSocket::IPv6Protocol
-                            ? QAbstractSocket::AnyIPProtocol
-                            : QAbstractSocket::IPv4Protocol;
-    socket->connectToHost(host, quint16(m_remotePort), QIODevice::ReadWrite, family);
+    if (!literal.isNull()) {
+        startConnecting({ literal });
+        return true;
+    }
+    m_state = StateResolvingHost;
+    m_lookupId = QHostInfo::lookupHost(host, this, [this](const QHostInfo &info) {
+        m_lookupId = -1;
+        QList<QHostAddress> addresses;
+        for (const QHostAddress &address : info.addresses()) {
+            if (address.protocol() == QAbstractSocket::IPv4Protocol)
+                addresses << address;
+        }
+        if (addresses.isEmpty())
+            failConnecting(QAbstractSocket::HostNotFoundError, info.errorString());
+        else
+            startConnecting(addresses);
+    });
     return true;
+}
+
+void QtSocketMember::startConnecting(const QList<QHostAddress> &addresses)
+{
+    m_state = StateConnecting;
+    auto *connector = new TcpConnector(this);
+    connect(connector, &TcpConnector::connected, this, &QtSocketMember::adoptConnection);
+    connect(connector, &TcpConnector::failed, this, &QtSocketMember::failConnecting);
+    m_connector = connector;
+    connector->start(addresses, quint16(m_remotePort), kConnectTimeoutMs);
+}
+
+void QtSocketMember::adoptConnection(int descriptor)
+{
+    dropConnector();
+    QTcpSocket *socket = createTcpSocket();
+    if (!socket->setSocketDescriptor(descriptor)) {
+        const QString reason = socket->errorString();
+        ::close(descriptor);
+        failConnecting(QAbstractSocket::UnknownSocketError, reason);
+        return;
+    }
+    m_state = StateConnected;
+    m_peerAddress = dottedAddress(socket->peerAddress());
+    Q_EMIT connected(index());
+}
+
+void QtSocketMember::failConnecting(QAbstractSocket::SocketError error, const QString &reason)
+{
+    const SocketFailure failure = describeSocketError(error, SocketActivity::Connecting,
+                                                      m_remoteHost.trimmed(), m_remotePort, reason);
+    releaseTransport();
+    m_state = StateError;
+    reportError(failure);
+}
+
+void QtSocketMember::dropConnector()
+{
+    if (TcpConnector *connector = m_connector) {
+        m_connector = nullptr;
+        connector->disconnect(this);
+        connector->abort();
+        connector->deleteLater();
+    }
 }
 
 bool QtSocketMember::accept(qintptr requestId)
@@ -265,41 +319,14 @@ QTcpSocket *QtSocketMember::createTcpSocket()
     auto *socket = new QTcpSocket(this);
     socket->setProxy(QNetworkProxy::NoProxy);
     socket->setReadBufferSize(m_readBufferSize);
-    connect(socket, &QTcpSocket::connected, this, &QtSocketMember::handleTcpConnected);
     connect(socket, &QTcpSocket::errorOccurred, this, &QtSocketMember::handleTcpError);
     connect(socket, &QTcpSocket::disconnected, this, &QtSocketMember::handleTcpDisconnected);
-    connect(socket, &QTcpSocket::stateChanged, this, &QtSocketMember::handleTcpStateChanged);
     connect(socket, &QTcpSocket::readyRead, this,
             [this] { Q_EMIT dataArrived(index(), m_tcp ? m_tcp->bytesAvailable() : 0); });
     connect(socket, &QTcpSocket::bytesWritten, this,
             [this](qint64 bytes) { Q_EMIT bytesWritten(index(), bytes); });
     m_tcp = socket;
     return socket;
-}
-
-void QtSocketMember::handleTcpStateChanged(QAbstractSocket::SocketState socketState)
-{
-    if (m_state != StateResolvingHost && m_state != StateConnecting)
-        return;
-    if (socketState == QAbstractSocket::HostLookupState)
-        m_state = StateResolvingHost;
-    else if (socketState == QAbstractSocket::ConnectingState)
-        m_state = StateConnecting;
-}
-
-void QtSocketMember::handleTcpConnected()
-{
-    m_state = StateConnected;
-    m_peerAddress = dottedAddress(m_tcp->peerAddress());
-    if (!m_inConnectCall) {
-        Q_EMIT connected(index());
-        return;
-    }
-    const quint64 generation = m_generation;
-    QTimer::singleShot(0, this, [this, generation] {
-        if (generation == m_generation && m_state == StateConnected)
-            Q_EMIT connected(index());
-    });
 }
 
 void QtSocketMember::handleTcpError(QAbstractSocket::SocketError error)
@@ -314,15 +341,7 @@ void QtSocketMember::handleTcpError(QAbstractSocket::SocketError error)
         wasConnected ? m_tcp->peerPort() : m_remotePort, m_tcp->errorString());
     releaseTransport();
     m_state = StateError;
-    if (!m_inConnectCall) {
-        reportError(failure);
-        return;
-    }
-    const quint64 generation = m_generation;
-    QTimer::singleShot(0, this, [this, generation, failure] {
-        if (generation == m_generation)
-            reportError(failure);
-    });
+    reportError(failure);
 }
 
 void QtSocketMember::handleTcpDisconnected()
@@ -421,7 +440,7 @@ QString QtSocketMember::errorString() const
 
 void QtSocketMember::releaseTransport()
 {
-    ++m_generation;
+    dropConnector();
     if (QTcpSocket *socket = m_tcp) {
         m_tcp = nullptr;
         socket->disconnect(this);

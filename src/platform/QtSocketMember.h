@@ -8,6 +8,7 @@
 #include <QPointer>
 
 class ConnectionRequestServer;
+class TcpConnector;
 class QTcpSocket;
 class QUdpSocket;
 
@@ -20,7 +21,9 @@ class QUdpSocket;
 // - localPort() is the port actually in use while the member is bound,
 //   listening or connected (so bind(0) reveals the chosen port), otherwise
 //   the value last set.
-// - A TCP client always connects from an ephemeral local port.
+// - A TCP client always connects from an ephemeral local port, with one
+//   connect() per address tried: a connection reset before the member saw it
+//   complete fails the attempt instead of starting another.
 // - bind() on a TCP member already binds and listens in the kernel but holds
 //   incoming connections back until listen(), so "port in use" shows at bind.
 // - States used: 0 closed, 1 open (UDP bound, or TCP bound before listen),
@@ -75,10 +78,12 @@ public:
     QString errorString() const override;
 
 private:
-    void handleTcpConnected();
+    void startConnecting(const QList<QHostAddress> &addresses);
+    void adoptConnection(int descriptor);
+    void failConnecting(QAbstractSocket::SocketError error, const QString &reason);
+    void dropConnector();
     void handleTcpError(QAbstractSocket::SocketError error);
     void handleTcpDisconnected();
-    void handleTcpStateChanged(QAbstractSocket::SocketState socketState);
     void handleConnectionRequest(qintptr descriptor);
     void handleAcceptError(QAbstractSocket::SocketError error);
     void handleUdpReadyRead();
@@ -107,11 +112,9 @@ private:
     int m_lastError = 0;
     QString m_errorString;
     qint64 m_readBufferSize = 0;
-    // Bumped by every teardown, so deferred work of an earlier life is dropped.
-    quint64 m_generation = 0;
-    bool m_inConnectCall = false;
     bool m_inDatagramCall = false;
 
+    QPointer<TcpConnector> m_connector;
     QPointer<QTcpSocket> m_tcp;
     QPointer<ConnectionRequestServer> m_server;
     QPointer<QUdpSocket> m_udp;

@@ -2,6 +2,7 @@
 
 #include "platform/SerialPortControl.h"
 
+#include <QElapsedTimer>
 #include <QFile>
 #include <QRegularExpression>
 
@@ -183,6 +184,40 @@ TEST_F(BridgeTest, ClientReconnectsAfterTheServerComesBack)
     ASSERT_TRUE(waitUntil([&] {
         return engine->statusLine(SessionEngine::NetworkLine) == QStringLiteral("TCP/IP Status: Connected");
     }));
+}
+
+TEST_F(BridgeTest, ClientFacingAResettingServerTriesOnceEveryFiveSecondsAndLogsEachAttempt)
+{
+    GlobalOptions::global().LogErrors = 1;
+    const int server = ::socket(AF_INET, SOCK_STREAM | SOCK_NONBLOCK, 0);
+    sockaddr_in address {};
+    address.sin_family = AF_INET;
+    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+    socklen_t length = sizeof address;
+    ASSERT_EQ(::bind(server, reinterpret_cast<sockaddr *>(&address), length), 0);
+    ASSERT_EQ(::listen(server, 16), 0);
+    ASSERT_EQ(::getsockname(server, reinterpret_cast<sockaddr *>(&address), &length), 0);
+    int accepts = 0;
+    auto resetWaiting = [&] {
+        for (int client; (client = ::accept(server, nullptr, nullptr)) >= 0; ++accepts) {
+            const linger abortive { 1, 0 };
+            setsockopt(client, SOL_SOCKET, SO_LINGER, &abortive, sizeof abortive);
+            ::close(client);
+        }
+        return accepts >= 2;
+    };
+    engine->settings().PortNumber = QString::number(ntohs(address.sin_port));
+    engine->Command1_Click();
+    // Reset before the session has seen its connection complete.
+    pollfd waiting { server, POLLIN, 0 };
+    ASSERT_EQ(::poll(&waiting, 1, 5000), 1);
+    resetWaiting();
+    QElapsedTimer sinceFirst;
+    sinceFirst.start();
+    EXPECT_TRUE(waitUntil(resetWaiting, 8000));
+    EXPECT_GE(sinceFirst.elapsed(), 4500) << "attempt " << accepts << " came early";
+    EXPECT_EQ(logLines(folder).filter(QStringLiteral("TCP/IP Status: Connecting...")).size(), accepts);
+    ::close(server);
 }
 
 TEST_F(BridgeTest, ActivationRefusalsTouchNothing)
