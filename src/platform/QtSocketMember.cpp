@@ -3,6 +3,7 @@
 #include "ConnectionRequestServer.h"
 #include "HostAddressText.h"
 #include "LocalAddresses.h"
+#include "StreamWriter.h"
 #include "TcpConnector.h"
 
 #include <QCoreApplication>
@@ -13,6 +14,7 @@
 #include <QTimer>
 #include <QUdpSocket>
 
+#include <fcntl.h>
 #include <unistd.h>
 
 namespace {
@@ -126,6 +128,11 @@ QString QtSocketMember::remoteHostIP() const
 int QtSocketMember::state() const
 {
     return m_state;
+}
+
+bool QtSocketMember::isHalfClosed() const
+{
+    return m_halfClosed && m_state == StateConnected;
 }
 
 bool QtSocketMember::isBusy() const
@@ -311,7 +318,23 @@ bool QtSocketMember::accept(qintptr requestId)
     }
     m_peerAddress = dottedAddress(socket->peerAddress());
     m_state = StateConnected;
+    keepSendingSide();
     return true;
+}
+
+void QtSocketMember::keepSendingSide()
+{
+    // Without a descriptor to spare, a half-close ends the connection.
+    const int descriptor = ::fcntl(int(m_tcp->socketDescriptor()), F_DUPFD_CLOEXEC, 0);
+    if (descriptor < 0)
+        return;
+    auto *writer = new StreamWriter(descriptor, this);
+    connect(writer, &StreamWriter::bytesWritten, this, [this](qint64 bytes) { Q_EMIT bytesWritten(index(), bytes); });
+    connect(writer, &StreamWriter::broken, this, [this] {
+        if (m_state == StateConnected || m_state == StateClosing)
+            announcePeerClose();
+    });
+    m_writer = writer;
 }
 
 QTcpSocket *QtSocketMember::createTcpSocket()
@@ -331,8 +354,10 @@ QTcpSocket *QtSocketMember::createTcpSocket()
 
 void QtSocketMember::handleTcpError(QAbstractSocket::SocketError error)
 {
-    // A close by the peer is reported by disconnected() right after.
-    if (error == QAbstractSocket::RemoteHostClosedError && m_state == StateConnected)
+    // A close by the peer is reported by disconnected() right after (or
+    // already was, when a send found it).
+    if (error == QAbstractSocket::RemoteHostClosedError
+        && (m_state == StateConnected || m_state == StateClosing))
         return;
     const bool wasConnected = m_state == StateConnected;
     const SocketFailure failure = describeSocketError(
@@ -348,7 +373,20 @@ void QtSocketMember::handleTcpDisconnected()
 {
     if (m_state != StateConnected)
         return;
+    // The peer may only have stopped sending and still wait for an answer.
+    if (m_writer && !m_writer->isBroken()) {
+        m_halfClosed = true;
+        m_writer->watchForEnd();
+        return;
+    }
+    announcePeerClose();
+}
+
+void QtSocketMember::announcePeerClose()
+{
     m_state = StateClosing;
+    if (m_writer)
+        m_writer->disconnect(this);
     Q_EMIT closed(index());
 }
 
@@ -377,6 +415,15 @@ bool QtSocketMember::sendData(const QByteArray &bytes)
                     QStringLiteral("Not connected; %1 bytes not sent").arg(bytes.size()));
     if (bytes.isEmpty())
         return true;
+    if (m_writer) {
+        if (m_writer->write(bytes))
+            return true;
+        // The connection is gone; closed() follows.
+        m_state = StateClosing;
+        return fail(ErrConnectionReset, QStringLiteral("Connection to %1 lost (%2); %3 bytes not sent")
+                                            .arg(m_peerAddress, m_writer->errorString())
+                                            .arg(bytes.size()));
+    }
     if (m_tcp->write(bytes) != bytes.size())
         return fail(SocketErrorNumber::kGeneralFailure,
                     QStringLiteral("Cannot send to %1: %2").arg(m_peerAddress, m_tcp->errorString()));
@@ -412,6 +459,8 @@ qint64 QtSocketMember::bytesToWrite() const
 {
     if (m_protocol == Udp)
         return m_waitingBytes;
+    if (m_writer)
+        return m_writer->bytesToWrite();
     return m_tcp ? m_tcp->bytesToWrite() : 0;
 }
 
@@ -441,6 +490,12 @@ QString QtSocketMember::errorString() const
 void QtSocketMember::releaseTransport()
 {
     dropConnector();
+    m_halfClosed = false;
+    if (StreamWriter *writer = m_writer) {
+        m_writer = nullptr;
+        writer->disconnect(this);
+        writer->finish(kLingerMs);
+    }
     if (QTcpSocket *socket = m_tcp) {
         m_tcp = nullptr;
         socket->disconnect(this);

@@ -8,6 +8,7 @@
 #include <QPointer>
 
 class ConnectionRequestServer;
+class StreamWriter;
 class TcpConnector;
 class QTcpSocket;
 class QUdpSocket;
@@ -35,6 +36,11 @@ class QUdpSocket;
 // - After the peer closes, the state is StateClosing (8) until close(); data
 //   received before the close can still be taken with getData(). A reset by
 //   the peer counts as a close: Qt does not tell the two apart.
+// - An accepted connection sends on a descriptor of its own (StreamWriter).
+//   When its peer stops sending it stays connected and half-closed: a FIN
+//   does not tell a half-close from a complete close, so the connection
+//   ends (closed()) only once a send fails or it is found reset or timed
+//   out. A client connection ends at the peer's FIN.
 // - UDP: getData() returns the next whole datagram whatever maxBytes says;
 //   bytesAvailable() is the size of the next datagram. sendData() goes to
 //   RemoteHost:RemotePort; with no RemoteHost it answers the sender of the
@@ -62,6 +68,7 @@ public:
     QString localIP() const override;
     QString remoteHostIP() const override;
     int state() const override;
+    bool isHalfClosed() const override;
 
     bool bind(int localPort, const QString &localAddress = {}) override;
     bool connectToRemote() override;
@@ -84,6 +91,8 @@ private:
     void dropConnector();
     void handleTcpError(QAbstractSocket::SocketError error);
     void handleTcpDisconnected();
+    void keepSendingSide();
+    void announcePeerClose();
     void handleConnectionRequest(qintptr descriptor);
     void handleAcceptError(QAbstractSocket::SocketError error);
     void handleUdpReadyRead();
@@ -116,6 +125,10 @@ private:
 
     QPointer<TcpConnector> m_connector;
     QPointer<QTcpSocket> m_tcp;
+    // The sending side of an accepted connection, and whether its peer has
+    // stopped sending.
+    QPointer<StreamWriter> m_writer;
+    bool m_halfClosed = false;
     QPointer<ConnectionRequestServer> m_server;
     QPointer<QUdpSocket> m_udp;
     QString m_peerAddress;

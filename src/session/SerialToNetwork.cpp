@@ -32,23 +32,43 @@ bool SessionEngine::anyConnected() const
     return false;
 }
 
+SocketMember *SessionEngine::firstClientToServe() const
+{
+    // The connected member with the lowest index. One whose client has
+    // stopped sending comes after all others: such a client used to be
+    // disconnected at once, and it may well have closed completely.
+    SocketMember *halfClosed = nullptr;
+    for (int i = 0; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
+        SocketMember *member = m_sockets[size_t(i)];
+        if (member->state() != SocketMember::StateConnected)
+            continue;
+        if (!member->isHalfClosed())
+            return member;
+        if (!halfClosed)
+            halfClosed = member;
+    }
+    return halfClosed;
+}
+
 void SessionEngine::sendBlock(SocketMember *member, const QByteArray &block)
 {
     // The block is lost for this peer: say so rather than drop it silently.
-    if (!member->sendData(block))
+    // A send that finds the peer gone is told by the close that follows.
+    if (!member->sendData(block) && member->state() != SocketMember::StateClosing)
         setStatusLine(NetworkLine, composeStatus(kNetworkCaption, 5099, member->errorString()));
 }
 
 void SessionEngine::SendToClients(const QByteArray &block)
 {
-    const bool firstOnly = isServer() && m_record.ServerSerialOptions == 2;
+    if (isServer() && m_record.ServerSerialOptions == 2) {
+        if (SocketMember *first = firstClientToServe())
+            sendBlock(first, block);
+        return;
+    }
     for (int i = 0; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
         SocketMember *member = m_sockets[size_t(i)];
-        if (member->state() != SocketMember::StateConnected)
-            continue;
-        sendBlock(member, block);
-        if (firstOnly)
-            break;
+        if (member->state() == SocketMember::StateConnected)
+            sendBlock(member, block);
     }
 }
 

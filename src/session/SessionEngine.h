@@ -141,6 +141,7 @@ private:
     void VirtualReceive();
     void VirtualOpenClose(bool opened);
     qint32 serialReadRoom() const;
+    SocketMember *firstClientToServe() const;
     bool serialInputIgnored() const;
     void moveSerialInput(const std::function<qint64()> &pending,
                          const std::function<QByteArray(qint32)> &read, bool mayHold);
@@ -159,6 +160,7 @@ private:
     // Connections.
     void handleConnect(int index);
     void ConnectionRequest(int index, qintptr requestId);
+    bool makeRoomForNewClient();
     void handleClose(int index);
     void handlePeerClose(int index);
     void finishCloseIfDrained(int index);

@@ -106,7 +106,10 @@ TEST_F(BridgeTest, FirstClientOnlyFollowsTheLowestIndexAfterReuse)
     first->write("written");
     EXPECT_EQ(pty.read(7), QByteArray("written"));
 
-    first->disconnectFromHost();
+    // Gone at once with a reset (a FIN alone may be only a half-close).
+    const linger abortive { 1, 0 };
+    setsockopt(int(first->socketDescriptor()), SOL_SOCKET, SO_LINGER, &abortive, sizeof abortive);
+    first->abort();
     ASSERT_TRUE(waitUntil([&] { return engine->record().ClientCount == 1; }));
     auto third = connectClient(); // reuses index 1
     EXPECT_EQ(engine->record().MaxSocketIndex, 2);
@@ -133,7 +136,7 @@ TEST_F(BridgeTest, IgnoreOptionsDropDataInTheirDirection)
     EXPECT_TRUE(client->readAll().isEmpty());
 }
 
-TEST_F(BridgeTest, SingleClientServerKeepsTheSecondClientOut)
+TEST_F(BridgeTest, SingleClientServerKeepsTheSecondClientOutUntilTheFirstStopsSending)
 {
     engine->record().AllowMultiConnect = 0;
     activateServer();
@@ -145,6 +148,16 @@ TEST_F(BridgeTest, SingleClientServerKeepsTheSecondClientOut)
     EXPECT_EQ(engine->record().ClientCount, 1);
     ASSERT_TRUE(pty.write("only one"));
     EXPECT_EQ(readSocket(*first, 8), QByteArray("only one"));
+
+    // A client that has stopped sending makes way for the next one.
+    ::shutdown(int(first->socketDescriptor()), SHUT_WR);
+    ASSERT_TRUE(waitUntil([&] { return engine->socket(1)->isHalfClosed(); }));
+    QTcpSocket third;
+    third.connectToHost(QStringLiteral("127.0.0.1"), quint16(serverPort()));
+    EXPECT_TRUE(waitUntil([&] { return first->state() == QAbstractSocket::UnconnectedState; }));
+    ASSERT_TRUE(pty.write("next one"));
+    EXPECT_EQ(readSocket(third, 8), QByteArray("next one"));
+    EXPECT_EQ(engine->record().ClientCount, 1);
 }
 
 TEST_F(BridgeTest, SlowSerialSideLosesNothingOfFourMiB)
