@@ -13,8 +13,9 @@ class TcpConnector;
 class QTcpSocket;
 class QUdpSocket;
 
-// A socket member over Qt Network: a QTcpSocket for a TCP client or an
-// accepted connection, a ConnectionRequestServer for a listening member, a
+// A socket member over Qt Network: a QTcpSocket for a TCP client (connected
+// by a TcpConnector) or an accepted connection (sending through a
+// StreamWriter), a ConnectionRequestServer for a listening member, a
 // QUdpSocket for UDP. Nothing here blocks: host names are looked up
 // asynchronously and every outcome of connectToRemote() arrives as a signal.
 //
