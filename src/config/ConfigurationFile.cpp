@@ -189,7 +189,7 @@ Configuration readConfiguration(const IniProfile &profile)
     o.PingEnabled = profile.readInt(g, QStringLiteral("PingEnabled"), 0);
     o.PingFrequency = profile.readInt(g, QStringLiteral("PingFrequency"), 3);
     o.PingTimeout = profile.readInt(g, QStringLiteral("PingTimeout"), 9);
-    o.PacketSize = profile.readInt(g, QStringLiteral("PacketSize"), 2000);
+    o.PacketSize = boundedPacketSize(profile.readInt(g, QStringLiteral("PacketSize"), kDefaultPacketSize));
     o.LoadWithWindows = profile.readInt(g, QStringLiteral("LoadWithWindows"), 0);
 
     const int sessionCount = std::min(config.NumSessions, kMaxSessionsRead);

@@ -20,5 +20,16 @@ struct GlobalOptions
     static GlobalOptions &global();
 };
 
+// Bounds of PacketSize, as the options dialog enforces them: one packet must
+// fit into one UDP datagram. Anything outside them becomes the default.
+constexpr qint32 kMinPacketSize = 1;
+constexpr qint32 kMaxPacketSize = 10000;
+constexpr qint32 kDefaultPacketSize = 2000;
+
+constexpr qint32 boundedPacketSize(qint32 size)
+{
+    return size >= kMinPacketSize && size <= kMaxPacketSize ? size : kDefaultPacketSize;
+}
+
 // Echo time-out in milliseconds used by the ping tools and the watchdog.
 extern int PingTimeoutMs;

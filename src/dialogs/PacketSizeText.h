@@ -1,13 +1,9 @@
 #pragma once
 
+#include "config/GlobalOptions.h"
+
 #include <QString>
 #include <QtGlobal>
-
-// Bounds of the "Max bytes per TCP/IP packet" option; anything outside them,
-// including text that is no number, becomes kDefaultPacketSize.
-constexpr qint32 kMinPacketSize = 1;
-constexpr qint32 kMaxPacketSize = 10000;
-constexpr qint32 kDefaultPacketSize = 2000;
 
 // The packet size that the text of the packet-size box stands for, read the
 // way the classic numeric reader does:

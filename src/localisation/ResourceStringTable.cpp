@@ -187,7 +187,7 @@ constexpr std::array kTable = std::to_array<ResourceStringEntry>({
     { 5099, "Error -", "エラー -" },
     { 5100, "Closed", "クローズ" },
     { 5101, "Connected Clients:", "接続中のクライアント:" },
-    { 5102, "Port numbers must range between 0 and 65565", "ポート番号は 0 から 65565 の範囲で指定してください" },
+    { 5102, "Port numbers must range between 0 and 65535", "ポート番号は 0 から 65535 の範囲で指定してください" },
     { 5103, "Error", "エラー" },
     { 5104, "Remote Host IP Address", "リモート ホストの IP アドレス" },
     { 5105, "Remote Port", "リモート ポート" },

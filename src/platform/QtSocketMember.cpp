@@ -3,17 +3,19 @@
 #include "ConnectionRequestServer.h"
 #include "HostAddressText.h"
 #include "LocalAddresses.h"
+#include "StreamWriter.h"
+#include "TcpConnector.h"
 
 #include <QCoreApplication>
 #include <QHostInfo>
 #include <QNetworkProxy>
-#include <QScopedValueRollback>
 #include <QSet>
 #include <QTcpSocket>
 #include <QTimer>
 #include <QUdpSocket>
 
 #include <cstring>
+#include <fcntl.h>
 #include <poll.h>
 #include <unistd.h>
 
@@ -22,6 +24,8 @@ namespace {
 // How long a locally closed connection may take to hand its queued bytes to
 // the peer before it is cut.
 constexpr int kLingerMs = 10000;
+// How long one address may take to answer a connection attempt.
+constexpr int kConnectTimeoutMs = 30000;
 
 // Connection requests announced but not yet taken over. A listening member
 // enters a descriptor before announcing it and closes it afterwards unless
@@ -128,6 +132,11 @@ int QtSocketMember::state() const
     return m_state;
 }
 
+bool QtSocketMember::isHalfClosed() const
+{
+    return m_halfClosed && m_state == StateConnected;
+}
+
 bool QtSocketMember::isBusy() const
 {
     return m_state != StateClosed && m_state != StateClosing && m_state != StateError;
@@ -222,16 +231,68 @@ bool QtSocketMember::connectToRemote()
 
     releaseTransport();
     m_peerAddress.clear();
-    QTcpSocket *socket = createTcpSocket();
-    m_state = literal.isNull() ? StateResolvingHost : StateConnecting;
-    // A loopback connection can succeed or be refused inside connectToHost();
-    // the outcome is still reported after this call returns.
-    QScopedValueRollback guard(m_inConnectCall, true);
-    const auto family = literal.protocol() == QAbstractSocket::IPv6Protocol
-                            ? QAbstractSocket::AnyIPProtocol
-                            : QAbstractSocket::IPv4Protocol;
-    socket->connectToHost(host, quint16(m_remotePort), QIODevice::ReadWrite, family);
+    if (!literal.isNull()) {
+        startConnecting({ literal });
+        return true;
+    }
+    m_state = StateResolvingHost;
+    m_lookupId = QHostInfo::lookupHost(host, this, [this](const QHostInfo &info) {
+        m_lookupId = -1;
+        QList<QHostAddress> addresses;
+        for (const QHostAddress &address : info.addresses()) {
+            if (address.protocol() == QAbstractSocket::IPv4Protocol)
+                addresses << address;
+        }
+        if (addresses.isEmpty())
+            failConnecting(QAbstractSocket::HostNotFoundError, info.errorString());
+        else
+            startConnecting(addresses);
+    });
     return true;
+}
+
+void QtSocketMember::startConnecting(const QList<QHostAddress> &addresses)
+{
+    m_state = StateConnecting;
+    auto *connector = new TcpConnector(this);
+    connect(connector, &TcpConnector::connected, this, &QtSocketMember::adoptConnection);
+    connect(connector, &TcpConnector::failed, this, &QtSocketMember::failConnecting);
+    m_connector = connector;
+    connector->start(addresses, quint16(m_remotePort), kConnectTimeoutMs);
+}
+
+void QtSocketMember::adoptConnection(int descriptor)
+{
+    dropConnector();
+    QTcpSocket *socket = createTcpSocket();
+    if (!socket->setSocketDescriptor(descriptor)) {
+        const QString reason = socket->errorString();
+        ::close(descriptor);
+        failConnecting(QAbstractSocket::UnknownSocketError, reason);
+        return;
+    }
+    m_state = StateConnected;
+    m_peerAddress = dottedAddress(socket->peerAddress());
+    Q_EMIT connected(index());
+}
+
+void QtSocketMember::failConnecting(QAbstractSocket::SocketError error, const QString &reason)
+{
+    const SocketFailure failure = describeSocketError(error, SocketActivity::Connecting,
+                                                      m_remoteHost.trimmed(), m_remotePort, reason);
+    releaseTransport();
+    m_state = StateError;
+    reportError(failure);
+}
+
+void QtSocketMember::dropConnector()
+{
+    if (TcpConnector *connector = m_connector) {
+        m_connector = nullptr;
+        connector->disconnect(this);
+        connector->abort();
+        connector->deleteLater();
+    }
 }
 
 bool QtSocketMember::accept(qintptr requestId)
@@ -258,7 +319,23 @@ bool QtSocketMember::accept(qintptr requestId)
     }
     m_peerAddress = dottedAddress(socket->peerAddress());
     m_state = StateConnected;
+    keepSendingSide();
     return true;
+}
+
+void QtSocketMember::keepSendingSide()
+{
+    // Without a descriptor to spare, a half-close ends the connection.
+    const int descriptor = ::fcntl(int(m_tcp->socketDescriptor()), F_DUPFD_CLOEXEC, 0);
+    if (descriptor < 0)
+        return;
+    auto *writer = new StreamWriter(descriptor, this);
+    connect(writer, &StreamWriter::bytesWritten, this, [this](qint64 bytes) { Q_EMIT bytesWritten(index(), bytes); });
+    connect(writer, &StreamWriter::broken, this, [this] {
+        if (m_state == StateConnected || m_state == StateClosing)
+            announcePeerClose();
+    });
+    m_writer = writer;
 }
 
 QTcpSocket *QtSocketMember::createTcpSocket()
@@ -266,10 +343,8 @@ QTcpSocket *QtSocketMember::createTcpSocket()
     auto *socket = new QTcpSocket(this);
     socket->setProxy(QNetworkProxy::NoProxy);
     socket->setReadBufferSize(m_readBufferSize);
-    connect(socket, &QTcpSocket::connected, this, &QtSocketMember::handleTcpConnected);
     connect(socket, &QTcpSocket::errorOccurred, this, &QtSocketMember::handleTcpError);
     connect(socket, &QTcpSocket::disconnected, this, &QtSocketMember::handleTcpDisconnected);
-    connect(socket, &QTcpSocket::stateChanged, this, &QtSocketMember::handleTcpStateChanged);
     connect(socket, &QTcpSocket::readyRead, this,
             [this] { Q_EMIT dataArrived(index(), m_tcp ? m_tcp->bytesAvailable() : 0); });
     connect(socket, &QTcpSocket::bytesWritten, this,
@@ -278,35 +353,12 @@ QTcpSocket *QtSocketMember::createTcpSocket()
     return socket;
 }
 
-void QtSocketMember::handleTcpStateChanged(QAbstractSocket::SocketState socketState)
-{
-    if (m_state != StateResolvingHost && m_state != StateConnecting)
-        return;
-    if (socketState == QAbstractSocket::HostLookupState)
-        m_state = StateResolvingHost;
-    else if (socketState == QAbstractSocket::ConnectingState)
-        m_state = StateConnecting;
-}
-
-void QtSocketMember::handleTcpConnected()
-{
-    m_state = StateConnected;
-    m_peerAddress = dottedAddress(m_tcp->peerAddress());
-    if (!m_inConnectCall) {
-        Q_EMIT connected(index());
-        return;
-    }
-    const quint64 generation = m_generation;
-    QTimer::singleShot(0, this, [this, generation] {
-        if (generation == m_generation && m_state == StateConnected)
-            Q_EMIT connected(index());
-    });
-}
-
 void QtSocketMember::handleTcpError(QAbstractSocket::SocketError error)
 {
-    // A close by the peer is reported by disconnected() right after.
-    if (error == QAbstractSocket::RemoteHostClosedError && m_state == StateConnected)
+    // A close by the peer is reported by disconnected() right after (or
+    // already was, when a send found it).
+    if (error == QAbstractSocket::RemoteHostClosedError
+        && (m_state == StateConnected || m_state == StateClosing))
         return;
     const bool wasConnected = m_state == StateConnected;
     const SocketFailure failure = describeSocketError(
@@ -315,22 +367,27 @@ void QtSocketMember::handleTcpError(QAbstractSocket::SocketError error)
         wasConnected ? m_tcp->peerPort() : m_remotePort, m_tcp->errorString());
     releaseTransport();
     m_state = StateError;
-    if (!m_inConnectCall) {
-        reportError(failure);
-        return;
-    }
-    const quint64 generation = m_generation;
-    QTimer::singleShot(0, this, [this, generation, failure] {
-        if (generation == m_generation)
-            reportError(failure);
-    });
+    reportError(failure);
 }
 
 void QtSocketMember::handleTcpDisconnected()
 {
     if (m_state != StateConnected)
         return;
+    // The peer may only have stopped sending and still wait for an answer.
+    if (m_writer && !m_writer->isBroken()) {
+        m_halfClosed = true;
+        m_writer->watchForEnd();
+        return;
+    }
+    announcePeerClose();
+}
+
+void QtSocketMember::announcePeerClose()
+{
     m_state = StateClosing;
+    if (m_writer)
+        m_writer->disconnect(this);
     Q_EMIT closed(index());
 }
 
@@ -365,6 +422,15 @@ bool QtSocketMember::sendData(const QByteArray &bytes)
                     QStringLiteral("Not connected; %1 bytes not sent").arg(bytes.size()));
     if (bytes.isEmpty())
         return true;
+    if (m_writer) {
+        if (m_writer->write(bytes))
+            return true;
+        // The connection is gone; closed() follows.
+        m_state = StateClosing;
+        return fail(ErrConnectionReset, QStringLiteral("Connection to %1 lost (%2); %3 bytes not sent")
+                                            .arg(m_peerAddress, m_writer->errorString())
+                                            .arg(bytes.size()));
+    }
     if (m_tcp->write(bytes) != bytes.size())
         return fail(SocketErrorNumber::kGeneralFailure,
                     QStringLiteral("Cannot send to %1: %2").arg(m_peerAddress, m_tcp->errorString()));
@@ -400,6 +466,8 @@ qint64 QtSocketMember::bytesToWrite() const
 {
     if (m_protocol == Udp)
         return m_waitingBytes;
+    if (m_writer)
+        return m_writer->bytesToWrite();
     return m_tcp ? m_tcp->bytesToWrite() : 0;
 }
 
@@ -407,6 +475,8 @@ qint64 QtSocketMember::bytesHeldBack() const
 {
     if (m_protocol == Udp)
         return m_waitingBytes;
+    if (m_writer)
+        return m_writer->bytesHeldBack();
     if (!m_tcp || m_tcp->bytesToWrite() == 0)
         return 0;
     // Bytes that the kernel would take have simply not been written yet.
@@ -450,7 +520,13 @@ QString QtSocketMember::errorString() const
 
 void QtSocketMember::releaseTransport()
 {
-    ++m_generation;
+    dropConnector();
+    m_halfClosed = false;
+    if (StreamWriter *writer = m_writer) {
+        m_writer = nullptr;
+        writer->disconnect(this);
+        writer->finish(kLingerMs);
+    }
     if (QTcpSocket *socket = m_tcp) {
         m_tcp = nullptr;
         socket->disconnect(this);

@@ -8,11 +8,14 @@
 #include <QPointer>
 
 class ConnectionRequestServer;
+class StreamWriter;
+class TcpConnector;
 class QTcpSocket;
 class QUdpSocket;
 
-// A socket member over Qt Network: a QTcpSocket for a TCP client or an
-// accepted connection, a ConnectionRequestServer for a listening member, a
+// A socket member over Qt Network: a QTcpSocket for a TCP client (connected
+// by a TcpConnector) or an accepted connection (sending through a
+// StreamWriter), a ConnectionRequestServer for a listening member, a
 // QUdpSocket for UDP. Nothing here blocks: host names are looked up
 // asynchronously and every outcome of connectToRemote() arrives as a signal.
 //
@@ -20,7 +23,9 @@ class QUdpSocket;
 // - localPort() is the port actually in use while the member is bound,
 //   listening or connected (so bind(0) reveals the chosen port), otherwise
 //   the value last set.
-// - A TCP client always connects from an ephemeral local port.
+// - A TCP client always connects from an ephemeral local port, with one
+//   connect() per address tried: a connection reset before the member saw it
+//   complete fails the attempt instead of starting another.
 // - bind() on a TCP member already binds and listens in the kernel but holds
 //   incoming connections back until listen(), so "port in use" shows at bind.
 // - States used: 0 closed, 1 open (UDP bound, or TCP bound before listen),
@@ -32,10 +37,16 @@ class QUdpSocket;
 // - After the peer closes, the state is StateClosing (8) until close(); data
 //   received before the close can still be taken with getData(). A reset by
 //   the peer counts as a close: Qt does not tell the two apart.
+// - An accepted connection sends on a descriptor of its own (StreamWriter).
+//   When its peer stops sending it stays connected and half-closed: a FIN
+//   does not tell a half-close from a complete close, so the connection
+//   ends (closed()) only once a send fails or it is found reset or timed
+//   out. A client connection ends at the peer's FIN.
 // - UDP: getData() returns the next whole datagram whatever maxBytes says;
 //   bytesAvailable() is the size of the next datagram. sendData() goes to
-//   RemoteHost:RemotePort; with no RemoteHost (or RemotePort 0) it answers
-//   the sender of the last datagram received. A host name is looked up once
+//   RemoteHost:RemotePort; with no RemoteHost it answers the sender of the
+//   last datagram received, at the address and port that datagram came
+//   from (RemotePort 0 takes that port too). A host name is looked up once
 //   per RemoteHost text; datagrams sent meanwhile wait for the answer and are
 //   dropped (with lastError() set) if the name does not resolve.
 // - Failures inside a call return false and set lastError(); they never also
@@ -58,6 +69,7 @@ public:
     QString localIP() const override;
     QString remoteHostIP() const override;
     int state() const override;
+    bool isHalfClosed() const override;
 
     bool bind(int localPort, const QString &localAddress = {}) override;
     bool connectToRemote() override;
@@ -76,10 +88,14 @@ public:
     QString errorString() const override;
 
 private:
-    void handleTcpConnected();
+    void startConnecting(const QList<QHostAddress> &addresses);
+    void adoptConnection(int descriptor);
+    void failConnecting(QAbstractSocket::SocketError error, const QString &reason);
+    void dropConnector();
     void handleTcpError(QAbstractSocket::SocketError error);
     void handleTcpDisconnected();
-    void handleTcpStateChanged(QAbstractSocket::SocketState socketState);
+    void keepSendingSide();
+    void announcePeerClose();
     void handleConnectionRequest(qintptr descriptor);
     void handleAcceptFailure(int errorNumber);
     void handleUdpReadyRead();
@@ -108,12 +124,14 @@ private:
     int m_lastError = 0;
     QString m_errorString;
     qint64 m_readBufferSize = 0;
-    // Bumped by every teardown, so deferred work of an earlier life is dropped.
-    quint64 m_generation = 0;
-    bool m_inConnectCall = false;
     bool m_inDatagramCall = false;
 
+    QPointer<TcpConnector> m_connector;
     QPointer<QTcpSocket> m_tcp;
+    // The sending side of an accepted connection, and whether its peer has
+    // stopped sending.
+    QPointer<StreamWriter> m_writer;
+    bool m_halfClosed = false;
     QPointer<ConnectionRequestServer> m_server;
     QPointer<QUdpSocket> m_udp;
     QString m_peerAddress;

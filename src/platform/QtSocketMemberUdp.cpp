@@ -58,7 +58,9 @@ bool QtSocketMember::sendDatagram(const QByteArray &bytes)
     const QString host = m_remoteHost.trimmed();
     if (host.isEmpty() && m_lastSender.isNull())
         return fail(ErrAddressNotAvailable, QStringLiteral("No remote host to send the datagram to"));
-    const int port = m_remotePort > 0 ? m_remotePort : m_lastSenderPort;
+    // Without a remote host the member answers the last sender, at the port
+    // its datagram came from: a client sends from a port of its own.
+    const int port = host.isEmpty() || m_remotePort <= 0 ? m_lastSenderPort : m_remotePort;
     if (!isValidPort(port))
         return fail(ErrAddressNotAvailable,
                     QStringLiteral("Remote port %1 is out of range (1-65535); datagram not sent")

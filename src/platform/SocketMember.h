@@ -45,6 +45,9 @@ public:
     // Dotted address of the connected peer (or of the last datagram's sender).
     virtual QString remoteHostIP() const = 0;
     virtual int state() const = 0;
+    // The peer has shut down its sending side but still receives: the
+    // member stays connected and sends until the connection ends.
+    virtual bool isHalfClosed() const = 0;
 
     // Bind / Connect / Listen return false on an immediate failure, with
     // lastError()/errorString() describing it; Connect's later outcome comes

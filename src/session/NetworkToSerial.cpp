@@ -11,8 +11,11 @@
 
 int SessionEngine::firstConnectedIndex() const
 {
+    // A client that has stopped sending has nothing more to write; it must
+    // not keep the next client's data out.
     for (int i = 1; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
-        if (m_sockets[size_t(i)]->state() == SocketMember::StateConnected)
+        const SocketMember *member = m_sockets[size_t(i)];
+        if (member->state() == SocketMember::StateConnected && !member->isHalfClosed())
             return i;
     }
     return m_record.MaxSocketIndex + 1;

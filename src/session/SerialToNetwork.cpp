@@ -13,12 +13,12 @@
 
 namespace {
 
-constexpr int kDefaultPacketSize = 2000;
+constexpr int kNetworkCaption = 5091;
 
 qint32 packetSize()
 {
     const qint32 size = GlobalOptions::global().PacketSize;
-    return size >= 1 ? size : kDefaultPacketSize;
+    return size >= kMinPacketSize ? size : kDefaultPacketSize;
 }
 
 } // namespace
@@ -33,25 +33,51 @@ bool SessionEngine::anyConnected() const
 }
 
 // The members that get serial data: the connected ones, or only the first
-// of them with "first client only".
+// client to serve with "first client only".
 QList<int> SessionEngine::serialReceivers() const
 {
-    const bool firstOnly = isServer() && m_record.ServerSerialOptions == 2;
+    if (isServer() && m_record.ServerSerialOptions == 2) {
+        const int first = firstClientToServe();
+        return first >= 0 ? QList<int> { first } : QList<int> {};
+    }
     QList<int> receivers;
     for (int i = 0; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
-        if (m_sockets[size_t(i)]->state() != SocketMember::StateConnected)
-            continue;
-        receivers << i;
-        if (firstOnly)
-            break;
+        if (m_sockets[size_t(i)]->state() == SocketMember::StateConnected)
+            receivers << i;
     }
     return receivers;
+}
+
+int SessionEngine::firstClientToServe() const
+{
+    // The connected member with the lowest index. One whose client has
+    // stopped sending comes after all others: such a client used to be
+    // disconnected at once, and it may well have closed completely.
+    int halfClosed = -1;
+    for (int i = 0; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
+        const SocketMember *member = m_sockets[size_t(i)];
+        if (member->state() != SocketMember::StateConnected)
+            continue;
+        if (!member->isHalfClosed())
+            return i;
+        if (halfClosed < 0)
+            halfClosed = i;
+    }
+    return halfClosed;
+}
+
+void SessionEngine::sendBlock(SocketMember *member, const QByteArray &block)
+{
+    // The block is lost for this peer: say so rather than drop it silently.
+    // A send that finds the peer gone is told by the close that follows.
+    if (!member->sendData(block) && member->state() != SocketMember::StateClosing)
+        setStatusLine(NetworkLine, composeStatus(kNetworkCaption, 5099, member->errorString()));
 }
 
 void SessionEngine::SendToClients(const QByteArray &block)
 {
     for (const int i : serialReceivers())
-        m_sockets[size_t(i)]->sendData(block);
+        sendBlock(m_sockets[size_t(i)], block);
 }
 
 qint32 SessionEngine::serialReadRoom()
@@ -92,11 +118,11 @@ void SessionEngine::sendHeldData(bool packetMode, bool mayHold)
         if (packetMode) {
             while (m_myBuffer.count() >= packetSize()) {
                 qint32 n = packetSize();
-                member->sendData(ReadFromMyBuffer(n));
+                sendBlock(member, ReadFromMyBuffer(n));
             }
         } else if (m_myBuffer.count() > 0) {
             qint32 n = -1;
-            member->sendData(ReadFromMyBuffer(n));
+            sendBlock(member, ReadFromMyBuffer(n));
         }
         return;
     }
@@ -201,7 +227,7 @@ void SessionEngine::flushOnTimeout()
     bool sent = false;
     if (m_record.UseUDP) {
         qint32 n = -1;
-        socket(0)->sendData(ReadFromMyBuffer(n));
+        sendBlock(socket(0), ReadFromMyBuffer(n));
         sent = true;
     } else if (anyConnected()) {
         qint32 n = -1;

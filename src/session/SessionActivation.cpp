@@ -89,7 +89,8 @@ void SessionEngine::deactivate()
 
 void SessionEngine::activate()
 {
-    if (m_settings.IPAddress.isEmpty()) {
+    // Only a client has a remote host; a server's field is hidden and unused.
+    if (m_settings.TCPOption == 0 && m_settings.IPAddress.isEmpty()) {
         setStatusLine(NetworkLine, composeStatus(kNetworkCaption, 5088));
         return;
     }
@@ -104,6 +105,11 @@ void SessionEngine::activate()
             setCaption(LoadResString(5119) + QStringLiteral(" - ") + LoadResString(5120));
         setStatusLine(ComLine, LoadResString(kComCaption));
         setStatusLine(NetworkLine, LoadResString(kNetworkCaption));
+        return;
+    }
+    if (m_record.ComPortNumber < 0 || m_record.ComPortNumber >= SessionLists::kConnectorCount) {
+        setStatusLine(ComLine, composeStatus(kComCaption, 5095)
+                                   + QStringLiteral(" (\"%1\" names no connector)").arg(m_settings.ConnectorText));
         return;
     }
 
@@ -156,6 +162,8 @@ void SessionEngine::activate()
         }
     } else {
         m_record.TCPOption = 1;
+        // A server answers whoever sent last, never the client role's host.
+        member->setRemoteHost(QString());
         member->setLocalPort(portValue);
         if (m_record.UseUDP)
             member->setRemotePort(portValue);
@@ -194,12 +202,13 @@ bool SessionEngine::openPhysicalPort()
     m_serialPort->setOutBufferSize(kSerialQueueSize);
     if (!sizeBuffers())
         return false;
-    if (!m_serialPort->open()) {
-        failSerialOpen(m_serialPort->errorString());
-        return false;
-    }
-    if (!m_serialPort->isOpen()) {
-        setStatusLine(ComLine, composeStatus(kComCaption, 5095));
+    if (!m_serialPort->open() || !m_serialPort->isOpen()) {
+        // "Port not available" stays the words scripts look for; the
+        // reason follows in parentheses.
+        const QString reason = m_serialPort->errorString();
+        m_serialPort->close();
+        setStatusLine(ComLine, composeStatus(kComCaption, 5095)
+                                   + (reason.isEmpty() ? QString() : QStringLiteral(" (%1)").arg(reason)));
         return false;
     }
     setStatusLine(ComLine, composeStatus(kComCaption, 5096));

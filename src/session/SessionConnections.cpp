@@ -76,9 +76,9 @@ void SessionEngine::showClientCount()
 void SessionEngine::ConnectionRequest(int, qintptr requestId)
 {
     // A request left alone here is closed by the socket layer at once.
-    if (m_record.AllowMultiConnect == 0 && m_record.ClientCount != 0)
-        return;
     if (!isServer())
+        return;
+    if (m_record.AllowMultiConnect == 0 && m_record.ClientCount != 0 && !makeRoomForNewClient())
         return;
     ++m_record.ClientCount;
     int chosen = 0;
@@ -103,6 +103,25 @@ void SessionEngine::ConnectionRequest(int, qintptr requestId)
     }
     noteNewConnection(chosen);
     showClientCount();
+}
+
+bool SessionEngine::makeRoomForNewClient()
+{
+    // The one client may only have stopped sending, or may have closed
+    // completely unnoticed (the two look alike): it gives way to a new one,
+    // which it used to do by being disconnected at once, once what it sent
+    // has been taken.
+    for (int i = 1; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
+        const SocketMember *member = socket(i);
+        if (member->state() == SocketMember::StateConnected
+            && (!member->isHalfClosed() || member->bytesAvailable() > 0))
+            return false;
+    }
+    for (int i = 1; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
+        if (socket(i)->isHalfClosed())
+            handleClose(i);
+    }
+    return m_record.ClientCount == 0;
 }
 
 void SessionEngine::handlePeerClose(int index)

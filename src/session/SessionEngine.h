@@ -97,6 +97,8 @@ public:
 
     // Sends one block to the connected members by the routing options.
     void SendToClients(const QByteArray &block);
+    // Sends one block on one member; a failed send shows on the TCP/IP line.
+    void sendBlock(SocketMember *member, const QByteArray &block);
     // Writes one line to the error log and starts the error program.
     void LogErrors(const QString &message);
 
@@ -153,6 +155,7 @@ private:
     void VirtualReceive();
     void VirtualOpenClose(bool opened);
     QList<int> serialReceivers() const;
+    int firstClientToServe() const;
     qint32 serialReadRoom();
     bool serialInputIgnored() const;
     void moveSerialInput(const std::function<qint64()> &pending,
@@ -172,6 +175,7 @@ private:
     // Connections.
     void handleConnect(int index);
     void ConnectionRequest(int index, qintptr requestId);
+    bool makeRoomForNewClient();
     void handleClose(int index);
     void handlePeerClose(int index);
     void finishCloseIfDrained(int index);

@@ -236,12 +236,12 @@ void SessionWindow::Combo2_Click(int index)
 
 void SessionWindow::Combo2_EditTextChanged(const QString &text)
 {
-    // Typed text that names no entry leaves the session without a chosen
-    // connector, like a list whose selection was cleared.
+    // Typed text chooses the entry it names, matched as the box itself does
+    // when it is left; text that names no entry leaves the session without
+    // a connector, like a list whose selection was cleared.
     SessionSettings &s = m_engine->settings();
     s.ConnectorText = text;
-    const int index = m_ui->Combo2->currentIndex();
-    s.Connector = index >= 0 && m_ui->Combo2->itemText(index) == text ? index : -1;
+    s.Connector = m_ui->Combo2->findText(text, Qt::MatchFixedString);
 }
 
 void SessionWindow::Command2_Click()

@@ -340,7 +340,7 @@ TEST(ConfigurationFile, BadValuesStayBounded)
     EXPECT_EQ(loadFile(path).NumSessions, -1);
     EXPECT_TRUE(loadFile(path).sessions.isEmpty());
 
-    writeFile(path, "[Velloca]\nNumSessions=2147483647\nPacketSize=-5\n"
+    writeFile(path, "[Velloca]\nNumSessions=2147483647\nPacketSize=70000\n"
                     "[Session1]\nPortNumber=99999\nBaudRate=1099511627776\nConnector=-1\n");
     QElapsedTimer timer;
     timer.start();
@@ -350,7 +350,7 @@ TEST(ConfigurationFile, BadValuesStayBounded)
     EXPECT_EQ(config.sessions[0].settings.PortNumber, QStringLiteral("99999"));
     EXPECT_EQ(config.sessions[0].settings.BaudRate, INT_MAX) << "2^40 is clamped, not wrapped";
     EXPECT_EQ(config.sessions[0].settings.Connector, -1);
-    EXPECT_EQ(config.options.PacketSize, -5);
+    EXPECT_EQ(config.options.PacketSize, 2000) << "the options dialog allows 1 to 10000";
 
     // Ten thousand real sections: read up to the cap, the rest kept and
     // numbered on behind the open sessions when one of those is closed.

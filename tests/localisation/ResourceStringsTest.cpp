@@ -112,6 +112,8 @@ TEST(ResourceStrings, TableHoldsEveryIdentifierInBothLanguages)
         EXPECT_EQ(japanese.endsWith(u' '), english.endsWith(u' '));
         EXPECT_EQ(accelerator(japanese), accelerator(english));
     }
+    // The highest port number, as the port check uses it.
+    EXPECT_TRUE(textIn(UiLanguage::Japanese, 5102).contains(QStringLiteral(" 65535 ")));
 }
 
 TEST(ResourceStrings, SystemLanguageFollowsLocaleEnvironment)

@@ -14,6 +14,8 @@
 #include <memory>
 #include <vector>
 
+#include <sys/socket.h>
+
 namespace {
 
 const QString kLoopback = QStringLiteral("127.0.0.1");
@@ -215,6 +217,18 @@ TEST(SocketMemberTest, TcpServerHandsRequestsToOtherMembersAndClosesUnacceptedOn
     EXPECT_EQ(takeFromMember(*members[1], 6), "from B");
     EXPECT_TRUE(members[1]->sendData("to B"));
     EXPECT_EQ(takeFromPeer(clientB, 4), "to B");
+
+    // B stops sending but still receives; once B has closed completely, a
+    // send finds it gone.
+    QSignalSpy closedB(members[1].get(), &SocketMember::closed);
+    ASSERT_EQ(::shutdown(int(clientB.socketDescriptor()), SHUT_WR), 0);
+    ASSERT_TRUE(waitUntil([&] { return members[1]->isHalfClosed(); }));
+    EXPECT_TRUE(members[1]->sendData("answer"));
+    EXPECT_EQ(takeFromPeer(clientB, 6), "answer");
+    clientB.abort();
+    EXPECT_TRUE(waitUntil([&] { return !members[1]->sendData("more") || closedB.count() > 0; }));
+    ASSERT_TRUE(waitUntil([&] { return closedB.count() == 1; }));
+    EXPECT_EQ(members[1]->state(), SocketMember::StateClosing);
 
     // Nobody accepts: the client is disconnected at once, not left hanging.
     acceptRequests = false;

@@ -2,6 +2,7 @@
 
 #include "platform/SerialPortControl.h"
 
+#include <QElapsedTimer>
 #include <QFile>
 #include <QRegularExpression>
 
@@ -105,7 +106,10 @@ TEST_F(BridgeTest, FirstClientOnlyFollowsTheLowestIndexAfterReuse)
     first->write("written");
     EXPECT_EQ(pty.read(7), QByteArray("written"));
 
-    first->disconnectFromHost();
+    // Gone at once with a reset (a FIN alone may be only a half-close).
+    const linger abortive { 1, 0 };
+    setsockopt(int(first->socketDescriptor()), SOL_SOCKET, SO_LINGER, &abortive, sizeof abortive);
+    first->abort();
     ASSERT_TRUE(waitUntil([&] { return engine->record().ClientCount == 1; }));
     auto third = connectClient(); // reuses index 1
     EXPECT_EQ(engine->record().MaxSocketIndex, 2);
@@ -132,7 +136,7 @@ TEST_F(BridgeTest, IgnoreOptionsDropDataInTheirDirection)
     EXPECT_TRUE(client->readAll().isEmpty());
 }
 
-TEST_F(BridgeTest, SingleClientServerKeepsTheSecondClientOut)
+TEST_F(BridgeTest, SingleClientServerKeepsTheSecondClientOutUntilTheFirstStopsSending)
 {
     engine->record().AllowMultiConnect = 0;
     activateServer();
@@ -144,6 +148,16 @@ TEST_F(BridgeTest, SingleClientServerKeepsTheSecondClientOut)
     EXPECT_EQ(engine->record().ClientCount, 1);
     ASSERT_TRUE(pty.write("only one"));
     EXPECT_EQ(readSocket(*first, 8), QByteArray("only one"));
+
+    // A client that has stopped sending makes way for the next one.
+    ::shutdown(int(first->socketDescriptor()), SHUT_WR);
+    ASSERT_TRUE(waitUntil([&] { return engine->socket(1)->isHalfClosed(); }));
+    QTcpSocket third;
+    third.connectToHost(QStringLiteral("127.0.0.1"), quint16(serverPort()));
+    EXPECT_TRUE(waitUntil([&] { return first->state() == QAbstractSocket::UnconnectedState; }));
+    ASSERT_TRUE(pty.write("next one"));
+    EXPECT_EQ(readSocket(third, 8), QByteArray("next one"));
+    EXPECT_EQ(engine->record().ClientCount, 1);
 }
 
 TEST_F(BridgeTest, SlowSerialSideLosesNothingOfFourMiB)
@@ -185,12 +199,50 @@ TEST_F(BridgeTest, ClientReconnectsAfterTheServerComesBack)
     }));
 }
 
+TEST_F(BridgeTest, ClientFacingAResettingServerTriesOnceEveryFiveSecondsAndLogsEachAttempt)
+{
+    GlobalOptions::global().LogErrors = 1;
+    const int server = ::socket(AF_INET, SOCK_STREAM | SOCK_NONBLOCK, 0);
+    sockaddr_in address {};
+    address.sin_family = AF_INET;
+    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+    socklen_t length = sizeof address;
+    ASSERT_EQ(::bind(server, reinterpret_cast<sockaddr *>(&address), length), 0);
+    ASSERT_EQ(::listen(server, 16), 0);
+    ASSERT_EQ(::getsockname(server, reinterpret_cast<sockaddr *>(&address), &length), 0);
+    int accepts = 0;
+    auto resetWaiting = [&] {
+        for (int client; (client = ::accept(server, nullptr, nullptr)) >= 0; ++accepts) {
+            const linger abortive { 1, 0 };
+            setsockopt(client, SOL_SOCKET, SO_LINGER, &abortive, sizeof abortive);
+            ::close(client);
+        }
+        return accepts >= 2;
+    };
+    engine->settings().PortNumber = QString::number(ntohs(address.sin_port));
+    engine->Command1_Click();
+    // Reset before the session has seen its connection complete.
+    pollfd waiting { server, POLLIN, 0 };
+    ASSERT_EQ(::poll(&waiting, 1, 5000), 1);
+    resetWaiting();
+    QElapsedTimer sinceFirst;
+    sinceFirst.start();
+    EXPECT_TRUE(waitUntil(resetWaiting, 8000));
+    EXPECT_GE(sinceFirst.elapsed(), 4500) << "attempt " << accepts << " came early";
+    EXPECT_EQ(logLines(folder).filter(QStringLiteral("TCP/IP Status: Connecting...")).size(), accepts);
+    ::close(server);
+}
+
 TEST_F(BridgeTest, ActivationRefusalsTouchNothing)
 {
     engine->settings().IPAddress.clear();
     engine->Command1_Click();
     EXPECT_EQ(engine->statusLine(SessionEngine::NetworkLine), QStringLiteral("TCP/IP Status: Error - Invalid IP Address"));
     EXPECT_FALSE(engine->isActive());
+    // A server has no remote host: its hidden field does not matter.
+    activateServer();
+    engine->Command1_Click();
+    engine->settings().TCPOption = 0;
 
     engine->settings().IPAddress = QStringLiteral("127.0.0.1");
     for (const char *bad : { "65536", "-1" }) {
@@ -209,12 +261,23 @@ TEST_F(BridgeTest, ActivationRefusalsTouchNothing)
     EXPECT_EQ(engine->statusLine(SessionEngine::NetworkLine), QStringLiteral("TCP/IP Status:"));
     EXPECT_FALSE(engine->isActive());
 
+    // Typed text that names no connector creates nothing.
+    engine->settings().Connector = -1;
+    engine->settings().ConnectorText = QStringLiteral("my port");
+    engine->settings().CreateVirtualPort = 1;
+    engine->Command1_Click();
+    EXPECT_EQ(engine->statusLine(SessionEngine::ComLine),
+              QStringLiteral("COM Status: Error - Port not available (\"my port\" names no connector)"));
+    EXPECT_FALSE(engine->isActive());
+    engine->settings().CreateVirtualPort = 0;
+
     // A device that does not exist: the reason is on the COM line.
     engine->settings().Connector = 9;
-    PortMap::global().setDevice(9, folder.filePath(QStringLiteral("ttyUSB9")));
+    const QString device = folder.filePath(QStringLiteral("ttyUSB9"));
+    PortMap::global().setDevice(9, device);
     engine->Command1_Click();
-    EXPECT_TRUE(engine->statusLine(SessionEngine::ComLine).startsWith(QStringLiteral("COM Status: Error - ")));
-    EXPECT_TRUE(engine->statusLine(SessionEngine::ComLine).contains(QStringLiteral("ttyUSB9")));
+    EXPECT_EQ(engine->statusLine(SessionEngine::ComLine),
+              QStringLiteral("COM Status: Error - Port not available (%1 does not exist)").arg(device));
     EXPECT_FALSE(engine->isActive());
 
     // A port already in use by another server closes the serial side again.

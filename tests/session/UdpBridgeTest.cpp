@@ -1,25 +1,26 @@
 #include "BridgeFixture.h"
 
+#include <QFile>
 #include <QNetworkDatagram>
 #include <QUdpSocket>
 
 namespace {
 
-// The peer sits on 127.0.0.2 so it can use the session's port number too.
+// The peer sends from an ephemeral port, as ordinary UDP clients do.
 class UdpBridgeTest : public BridgeTest
 {
 protected:
     void activateUdpServer()
     {
         const int port = freePort();
-        ASSERT_TRUE(peer.bind(QHostAddress(QStringLiteral("127.0.0.2")), quint16(port)));
+        ASSERT_TRUE(peer.bind(QHostAddress::LocalHost, 0));
         engine->settings().UseUDP = 1;
         engine->settings().TCPOption = 1;
         engine->settings().PortNumber = QString::number(port);
         engine->Command1_Click();
         ASSERT_TRUE(engine->isActive());
         EXPECT_EQ(engine->statusLine(SessionEngine::NetworkLine), QStringLiteral("TCP/IP Status: Listening..."));
-        // The session answers whoever sent last.
+        // The session answers whoever sent last, at the port it came from.
         peer.writeDatagram("hello", QHostAddress::LocalHost, quint16(port));
         ASSERT_EQ(pty.read(5), QByteArray("hello"));
     }
@@ -68,6 +69,27 @@ TEST_F(UdpBridgeTest, ImmediateModeSendsWhatArrivedAndDatagramsReachTheSerialSid
     const QByteArray big = randomBytes(8000);
     peer.writeDatagram(big, QHostAddress::LocalHost, quint16(engine->socket(0)->localPort()));
     EXPECT_TRUE(pty.read(big.size()) == big);
+}
+
+} // namespace
+
+namespace {
+
+TEST_F(UdpBridgeTest, SendThatFailsIsShownAndLogged)
+{
+    GlobalOptions::global().LogErrors = 1;
+    GlobalOptions::global().PacketSize = 70000; // more than one datagram carries
+    engine->settings().WaitForCr = 1;
+    engine->settings().TimeoutValue = QStringLiteral("100000");
+    engine->settings().BufferSize = 6; // 131072 bytes
+    activateUdpServer();
+    ASSERT_TRUE(pty.write(randomBytes(70000)));
+    const QString failure = QStringLiteral("TCP/IP Status: Error - Datagram too large");
+    EXPECT_TRUE(waitUntil([&] { return engine->statusLine(SessionEngine::NetworkLine).startsWith(failure); }))
+        << engine->statusLine(SessionEngine::NetworkLine).toStdString();
+    QFile log(folder.filePath(QStringLiteral("errorlog.txt")));
+    ASSERT_TRUE(log.open(QIODevice::ReadOnly));
+    EXPECT_TRUE(QString::fromUtf8(log.readAll()).contains(failure));
 }
 
 } // namespace

@@ -8,6 +8,7 @@
 #include "support/Wait.h"
 
 #include <QAbstractButton>
+#include <QApplication>
 #include <QComboBox>
 #include <QGroupBox>
 #include <QLabel>
@@ -139,7 +140,7 @@ TEST_F(SessionWindowTest, PortAbove65535WarnsOnEveryKeystrokeButKeepsTheText)
     EXPECT_TRUE(messages.isEmpty());
     QTest::keyClicks(port, QStringLiteral("0"));
     ASSERT_EQ(messages.size(), 1);
-    EXPECT_EQ(messages[0].text, QStringLiteral("Port numbers must range between 0 and 65565"));
+    EXPECT_EQ(messages[0].text, QStringLiteral("Port numbers must range between 0 and 65535"));
     EXPECT_EQ(messages[0].title, QStringLiteral("Error"));
     QTest::keyClicks(port, QStringLiteral("1"));
     EXPECT_EQ(messages.size(), 2);
@@ -152,7 +153,7 @@ TEST_F(SessionWindowTest, PortAbove65535WarnsOnEveryKeystrokeButKeepsTheText)
     EXPECT_EQ(messages.size(), 2);
 }
 
-TEST_F(SessionWindowTest, ConnectorChoiceSetsTheCommandTopicAndTypedTextSelectsNothing)
+TEST_F(SessionWindowTest, ConnectorChoiceSetsTheCommandTopicAndTypedTextSelectsOnlyAConnector)
 {
     auto *connector = child<QComboBox>("Combo2");
     QSignalSpy topics(&engine, &SessionEngine::commandTopicChanged);
@@ -165,6 +166,18 @@ TEST_F(SessionWindowTest, ConnectorChoiceSetsTheCommandTopicAndTypedTextSelectsN
     connector->setEditText(QStringLiteral("my port"));
     EXPECT_EQ(engine.settings().Connector, -1);
     EXPECT_EQ(engine.settings().ConnectorText, QStringLiteral("my port"));
+
+    // A typed connector name, left with Tab, is chosen as if picked.
+    QApplication::setActiveWindow(&window);
+    connector->setFocus();
+    connector->clearEditText();
+    QTest::keyClicks(connector, QStringLiteral("COM7"));
+    QTest::keyClick(connector, Qt::Key_Tab);
+    EXPECT_EQ(connector->currentIndex(), 7);
+    EXPECT_EQ(engine.settings().Connector, 7);
+    EXPECT_EQ(engine.settings().ConnectorText, QStringLiteral("COM7"));
+    EXPECT_EQ(engine.commandTopic(), QStringLiteral("COM7"));
+    connector->setEditText(QStringLiteral("my port"));
 
     // Every session lists the same connectors but keeps its own choice, and
     // typed text never adds to the list the others see.
