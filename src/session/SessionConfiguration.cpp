@@ -49,16 +49,7 @@ void SessionEngine::applyConfiguration(const SessionConfig &config)
     s.WaitForCr = from.WaitForCr == 1 ? 1 : 0;
     s.TimeoutValue = from.TimeoutValue;
 
-    const OptionsTransfer &o = config.options;
-    m_record.AllowMultiConnect = o.AllowMultiConnect;
-    m_record.ServerSerialOptions = o.ServerSerialOptions;
-    m_record.ServerTCPOptions = o.ServerTCPOptions;
-    m_record.ClientOptions = o.ClientOptions;
-    m_record.ConnectOnVirtualOpen = o.ConnectOnVirtualOpen;
-    m_record.UserPrompt = o.UserPrompt;
-    m_record.UserPromptResponse = o.UserPromptResponse;
-    m_record.PasswordPrompt = o.PasswordPrompt;
-    m_record.PasswordPromptResponse = o.PasswordPromptResponse;
+    copySessionOptions(config.options, m_record);
 
     setCommandTopic(s.ConnectorText);
     if (!from.SessionDescription.isEmpty()) {
@@ -72,16 +63,7 @@ SessionConfig SessionEngine::currentConfiguration() const
 {
     SessionConfig config;
     config.settings = m_settings;
-    OptionsTransfer &o = config.options;
-    o.AllowMultiConnect = m_record.AllowMultiConnect;
-    o.ServerSerialOptions = m_record.ServerSerialOptions;
-    o.ServerTCPOptions = m_record.ServerTCPOptions;
-    o.ClientOptions = m_record.ClientOptions;
-    o.ConnectOnVirtualOpen = m_record.ConnectOnVirtualOpen;
-    o.UserPrompt = m_record.UserPrompt;
-    o.UserPromptResponse = m_record.UserPromptResponse;
-    o.PasswordPrompt = m_record.PasswordPrompt;
-    o.PasswordPromptResponse = m_record.PasswordPromptResponse;
+    copySessionOptions(m_record, config.options);
     config.AutoActivate = isActive() ? 1 : 0;
     return config;
 }

@@ -137,25 +137,6 @@ void SessionEngine::setSettingsLocked(bool locked)
     Q_EMIT settingsLockChanged(locked);
 }
 
-namespace {
-
-// The session record and the transfer values name the nine options alike.
-template <typename From, typename To>
-void copySessionOptions(const From &from, To &to)
-{
-    to.AllowMultiConnect = from.AllowMultiConnect;
-    to.ServerSerialOptions = from.ServerSerialOptions;
-    to.ServerTCPOptions = from.ServerTCPOptions;
-    to.ClientOptions = from.ClientOptions;
-    to.ConnectOnVirtualOpen = from.ConnectOnVirtualOpen;
-    to.UserPrompt = from.UserPrompt;
-    to.UserPromptResponse = from.UserPromptResponse;
-    to.PasswordPrompt = from.PasswordPrompt;
-    to.PasswordPromptResponse = from.PasswordPromptResponse;
-}
-
-} // namespace
-
 void SessionEngine::Getstatus() const
 {
     copySessionOptions(m_record, OptionsTransfer::global());

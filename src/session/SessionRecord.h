@@ -23,3 +23,19 @@ struct SessionRecord
     int PingTicks = 0;
     int FlushTicks = 0;
 };
+
+// The session record, the transfer values and a saved configuration name
+// the nine routing and login options alike.
+template <typename From, typename To>
+void copySessionOptions(const From &from, To &to)
+{
+    to.AllowMultiConnect = from.AllowMultiConnect;
+    to.ServerSerialOptions = from.ServerSerialOptions;
+    to.ServerTCPOptions = from.ServerTCPOptions;
+    to.ClientOptions = from.ClientOptions;
+    to.ConnectOnVirtualOpen = from.ConnectOnVirtualOpen;
+    to.UserPrompt = from.UserPrompt;
+    to.UserPromptResponse = from.UserPromptResponse;
+    to.PasswordPrompt = from.PasswordPrompt;
+    to.PasswordPromptResponse = from.PasswordPromptResponse;
+}

@@ -36,9 +36,6 @@ QString iniValue(const QString &text, const QString &section, const QString &key
 // Reads from the socket until `count` bytes have arrived or the time is up.
 QByteArray readFromSocket(QTcpSocket &socket, int count, int timeoutMs = 10000);
 
-// Writes all bytes to a non-blocking descriptor, running the event loop
-// Reads from a non-blocking descriptor until `count` bytes have arrived or
-
 // Equal byte arrays; otherwise says the sizes and the first difference
 // instead of printing kilobytes of binary.
 ::testing::AssertionResult sameBytes(const QByteArray &actual, const QByteArray &expected);
