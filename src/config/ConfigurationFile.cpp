@@ -38,7 +38,7 @@ SessionConfig readSession(const IniProfile &profile, const QString &section)
     s.PortNumber = text("PortNumber", QString());
     s.TCPOption = number("TCPOption", 0) != 0 ? 1 : 0;
 
-    OptionsTransfer &o = session.options;
+    SessionOptions &o = session.options;
     o.AllowMultiConnect = number("AllowMultiConnect", 1);
     o.ServerSerialOptions = number("ServerSerialOptions", 0);
     o.ServerTCPOptions = number("ServerTCPOptions", 0);
@@ -106,7 +106,7 @@ void writeSession(IniProfile &profile, const QString &section, const SessionConf
     number("WaitForCr", s.WaitForCr);
     text("TimeoutValue", numericText(s.TimeoutValue));
 
-    const OptionsTransfer &o = session.options;
+    const SessionOptions &o = session.options;
     number("AllowMultiConnect", o.AllowMultiConnect);
     number("ServerSerialOptions", o.ServerSerialOptions);
     number("ServerTCPOptions", o.ServerTCPOptions);

@@ -2,7 +2,7 @@
 
 #include "GlobalOptions.h"
 #include "IniProfile.h"
-#include "OptionsTransfer.h"
+#include "SessionOptions.h"
 #include "SessionSettings.h"
 
 #include <QHash>
@@ -19,7 +19,7 @@
 struct SessionConfig
 {
     SessionSettings settings; // ConnectorText is neither read nor written
-    OptionsTransfer options;  // the nine routing and login values; LoginCancel unused
+    SessionOptions options;
     int AutoActivate = 0;     // as stored; only 1 activates after start-up
 };
 

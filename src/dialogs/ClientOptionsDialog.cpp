@@ -3,7 +3,7 @@
 
 #include "DialogKeys.h"
 #include "OptionControls.h"
-#include "config/OptionsTransfer.h"
+#include "config/SessionOptions.h"
 #include "viewsupport/ApplyResourceStrings.h"
 
 #include <QKeyEvent>
@@ -17,7 +17,7 @@ OptionGroup ioGroup(const Ui::ClientOptionsDialog &ui)
 
 } // namespace
 
-ClientOptionsDialog::ClientOptionsDialog(QWidget *parent)
+ClientOptionsDialog::ClientOptionsDialog(const SessionOptions &options, QWidget *parent)
     : QDialog(parent), m_ui(std::make_unique<Ui::ClientOptionsDialog>())
 {
     m_ui->setupUi(this);
@@ -25,32 +25,21 @@ ClientOptionsDialog::ClientOptionsDialog(QWidget *parent)
     setModal(true);
 
     connect(m_ui->Command1, &QPushButton::clicked, this, &ClientOptionsDialog::accept);
-    connect(m_ui->Command2, &QPushButton::clicked, this, &ClientOptionsDialog::Command2_Click);
+    connect(m_ui->Command2, &QPushButton::clicked, this, &ClientOptionsDialog::reject);
 
-    loadTransferValues();
+    m_options = options;
+    selectOption(ioGroup(*m_ui), options.ClientOptions);
+    showCheckValue(m_ui->chkConnectOnVirtualPort, options.ConnectOnVirtualOpen);
 }
 
 ClientOptionsDialog::~ClientOptionsDialog() = default;
 
-void ClientOptionsDialog::loadTransferValues()
+SessionOptions ClientOptionsDialog::options() const
 {
-    const OptionsTransfer &t = OptionsTransfer::global();
-    selectOption(ioGroup(*m_ui), t.ClientOptions);
-    showCheckValue(m_ui->chkConnectOnVirtualPort, t.ConnectOnVirtualOpen);
-}
-
-void ClientOptionsDialog::accept()
-{
-    OptionsTransfer &t = OptionsTransfer::global();
-    storeSelectedOption(ioGroup(*m_ui), t.ClientOptions);
-    t.ConnectOnVirtualOpen = checkValue(m_ui->chkConnectOnVirtualPort);
-    QDialog::accept();
-}
-
-void ClientOptionsDialog::Command2_Click()
-{
-    OptionsTransfer::global().ClientOptions = OptionsTransfer::kCancelled;
-    reject();
+    SessionOptions options = m_options;
+    storeSelectedOption(ioGroup(*m_ui), options.ClientOptions);
+    options.ConnectOnVirtualOpen = checkValue(m_ui->chkConnectOnVirtualPort);
+    return options;
 }
 
 void ClientOptionsDialog::keyPressEvent(QKeyEvent *event)
@@ -61,8 +50,10 @@ void ClientOptionsDialog::keyPressEvent(QKeyEvent *event)
         QDialog::keyPressEvent(event);
 }
 
-void showClientOptionsDialog(QWidget *parent)
+std::optional<SessionOptions> showClientOptionsDialog(QWidget *parent, const SessionOptions &options)
 {
-    ClientOptionsDialog dialog(parent);
-    dialog.exec();
+    ClientOptionsDialog dialog(options, parent);
+    if (dialog.exec() != QDialog::Accepted)
+        return std::nullopt;
+    return dialog.options();
 }

@@ -1,41 +1,35 @@
 #pragma once
 
+#include "config/SessionOptions.h"
+
 #include <QDialog>
 
 #include <memory>
+#include <optional>
 
 class QKeyEvent;
 namespace Ui { class ClientOptionsDialog; }
 
 // frmClientOptions: edits the routing options of a session in TCP client
-// role (which direction is switched off, and whether the network side
-// follows the virtual COM port). It takes and returns the values through the
-// options transfer variables ClientOptions and ConnectOnVirtualOpen:
-// - accept() (OK, Enter on OK, and Esc: OK is this dialog's cancel button)
-//   stores the edited values;
-// - Cancel stores OptionsTransfer::kCancelled in ClientOptions and leaves
-//   ConnectOnVirtualOpen as it was;
-// - reject() alone (closing by the window frame) stores nothing, so the
-//   values passed in come back unchanged.
+// role (inbound serial data, connect when the virtual port opens). OK and
+// Esc accept; Cancel and closing by the window frame reject.
 class ClientOptionsDialog : public QDialog
 {
     Q_OBJECT
 public:
-    explicit ClientOptionsDialog(QWidget *parent = nullptr);
+    explicit ClientOptionsDialog(const SessionOptions &options, QWidget *parent = nullptr);
     ~ClientOptionsDialog() override;
 
-    void accept() override;
+    // The options as edited (those the dialog does not edit as given).
+    SessionOptions options() const;
 
 protected:
     void keyPressEvent(QKeyEvent *event) override;
 
 private:
-    void loadTransferValues();
-    void Command2_Click();
-
     std::unique_ptr<Ui::ClientOptionsDialog> m_ui;
+    SessionOptions m_options;
 };
 
-// Shows the dialog modally and returns once it is closed; the session window
-// reads the outcome from the transfer variables.
-void showClientOptionsDialog(QWidget *parent);
+// Shows the dialog modally; the edited options, or nothing when cancelled.
+std::optional<SessionOptions> showClientOptionsDialog(QWidget *parent, const SessionOptions &options);

@@ -1,55 +1,37 @@
 #include "LoginOptionsDialog.h"
 #include "ui_LoginOptionsDialog.h"
 
-#include "config/OptionsTransfer.h"
+#include "config/SessionOptions.h"
 
 #include <QKeyEvent>
 #include <QPushButton>
 
-namespace {
-
-constexpr int kLoginCancelled = -1;
-
-} // namespace
-
-LoginOptionsDialog::LoginOptionsDialog(QWidget *parent)
+LoginOptionsDialog::LoginOptionsDialog(const SessionOptions &options, QWidget *parent)
     : QDialog(parent), m_ui(std::make_unique<Ui::LoginOptionsDialog>())
 {
     m_ui->setupUi(this);
     setModal(true);
 
     connect(m_ui->btnOK, &QPushButton::clicked, this, &LoginOptionsDialog::accept);
-    connect(m_ui->btnCancel, &QPushButton::clicked, this, &LoginOptionsDialog::btnCancel_Click);
+    connect(m_ui->btnCancel, &QPushButton::clicked, this, &LoginOptionsDialog::reject);
 
-    loadTransferTexts();
+    m_options = options;
+    m_ui->txtUserPrompt->setText(options.UserPrompt);
+    m_ui->txtUserPromptResponse->setText(options.UserPromptResponse);
+    m_ui->txtPasswordPrompt->setText(options.PasswordPrompt);
+    m_ui->txtPasswordPromptResponse->setText(options.PasswordPromptResponse);
 }
 
 LoginOptionsDialog::~LoginOptionsDialog() = default;
 
-void LoginOptionsDialog::loadTransferTexts()
+SessionOptions LoginOptionsDialog::options() const
 {
-    const OptionsTransfer &t = OptionsTransfer::global();
-    m_ui->txtUserPrompt->setText(t.UserPrompt);
-    m_ui->txtUserPromptResponse->setText(t.UserPromptResponse);
-    m_ui->txtPasswordPrompt->setText(t.PasswordPrompt);
-    m_ui->txtPasswordPromptResponse->setText(t.PasswordPromptResponse);
-}
-
-void LoginOptionsDialog::accept()
-{
-    OptionsTransfer &t = OptionsTransfer::global();
-    t.UserPrompt = m_ui->txtUserPrompt->text();
-    t.UserPromptResponse = m_ui->txtUserPromptResponse->text();
-    t.PasswordPrompt = m_ui->txtPasswordPrompt->text();
-    t.PasswordPromptResponse = m_ui->txtPasswordPromptResponse->text();
-    t.LoginCancel = 0;
-    QDialog::accept();
-}
-
-void LoginOptionsDialog::btnCancel_Click()
-{
-    OptionsTransfer::global().LoginCancel = kLoginCancelled;
-    reject();
+    SessionOptions options = m_options;
+    options.UserPrompt = m_ui->txtUserPrompt->text();
+    options.UserPromptResponse = m_ui->txtUserPromptResponse->text();
+    options.PasswordPrompt = m_ui->txtPasswordPrompt->text();
+    options.PasswordPromptResponse = m_ui->txtPasswordPromptResponse->text();
+    return options;
 }
 
 void LoginOptionsDialog::keyPressEvent(QKeyEvent *event)
@@ -70,8 +52,10 @@ void LoginOptionsDialog::keyPressEvent(QKeyEvent *event)
     }
 }
 
-void showLoginOptionsDialog(QWidget *parent)
+std::optional<SessionOptions> showLoginOptionsDialog(QWidget *parent, const SessionOptions &options)
 {
-    LoginOptionsDialog dialog(parent);
-    dialog.exec();
+    LoginOptionsDialog dialog(options, parent);
+    if (dialog.exec() != QDialog::Accepted)
+        return std::nullopt;
+    return dialog.options();
 }

@@ -1,42 +1,37 @@
 #pragma once
 
+#include "config/SessionOptions.h"
+
 #include <QDialog>
 
 #include <memory>
+#include <optional>
 
 class QKeyEvent;
 namespace Ui { class LoginOptionsDialog; }
 
 // frmLogin: edits the four login texts of one session (the prompts a remote
-// device sends and the answers to them). It takes and returns them through
-// the options transfer texts UserPrompt, UserPromptResponse, PasswordPrompt
-// and PasswordPromptResponse:
-// - accept() (btnOK) stores the four texts exactly as typed and sets
-//   LoginCancel to 0;
-// - btnCancel sets LoginCancel to -1 and stores nothing;
-// - closing by the window frame stores nothing and leaves LoginCancel as
-//   the last login dialog set it.
-// The captions are English in every language. Neither button answers Enter
-// or Esc; Enter presses a push button that has the focus, as a click would.
+// device sends and the answers to them), exactly as typed. btnOK accepts;
+// btnCancel and closing by the window frame reject. The captions are
+// English in every language. Neither button answers Enter or Esc; Enter
+// presses a push button that has the focus, as a click would.
 class LoginOptionsDialog : public QDialog
 {
     Q_OBJECT
 public:
-    explicit LoginOptionsDialog(QWidget *parent = nullptr);
+    explicit LoginOptionsDialog(const SessionOptions &options, QWidget *parent = nullptr);
     ~LoginOptionsDialog() override;
 
-    void accept() override;
+    // The options as edited (those the dialog does not edit as given).
+    SessionOptions options() const;
 
 protected:
     void keyPressEvent(QKeyEvent *event) override;
 
 private:
-    void loadTransferTexts();
-    void btnCancel_Click();
-
     std::unique_ptr<Ui::LoginOptionsDialog> m_ui;
+    SessionOptions m_options;
 };
 
-// Shows the dialog modally and returns once it is closed; the session window
-// reads the outcome from the transfer texts and LoginCancel.
-void showLoginOptionsDialog(QWidget *parent);
+// Shows the dialog modally; the edited texts, or nothing when cancelled.
+std::optional<SessionOptions> showLoginOptionsDialog(QWidget *parent, const SessionOptions &options);

@@ -3,7 +3,7 @@
 
 #include "DialogKeys.h"
 #include "OptionControls.h"
-#include "config/OptionsTransfer.h"
+#include "config/SessionOptions.h"
 #include "viewsupport/ApplyResourceStrings.h"
 
 #include <QKeyEvent>
@@ -22,7 +22,7 @@ OptionGroup serialGroup(const Ui::ServerOptionsDialog &ui)
 
 } // namespace
 
-ServerOptionsDialog::ServerOptionsDialog(QWidget *parent)
+ServerOptionsDialog::ServerOptionsDialog(const SessionOptions &options, QWidget *parent)
     : QDialog(parent), m_ui(std::make_unique<Ui::ServerOptionsDialog>())
 {
     m_ui->setupUi(this);
@@ -30,34 +30,23 @@ ServerOptionsDialog::ServerOptionsDialog(QWidget *parent)
     setModal(true);
 
     connect(m_ui->Command1, &QPushButton::clicked, this, &ServerOptionsDialog::accept);
-    connect(m_ui->Command2, &QPushButton::clicked, this, &ServerOptionsDialog::Command2_Click);
+    connect(m_ui->Command2, &QPushButton::clicked, this, &ServerOptionsDialog::reject);
 
-    loadTransferValues();
+    m_options = options;
+    showCheckValue(m_ui->chkMultiClients, options.AllowMultiConnect);
+    selectOption(serialGroup(*m_ui), options.ServerSerialOptions);
+    selectOption(tcpGroup(*m_ui), options.ServerTCPOptions);
 }
 
 ServerOptionsDialog::~ServerOptionsDialog() = default;
 
-void ServerOptionsDialog::loadTransferValues()
+SessionOptions ServerOptionsDialog::options() const
 {
-    const OptionsTransfer &t = OptionsTransfer::global();
-    showCheckValue(m_ui->chkMultiClients, t.AllowMultiConnect);
-    selectOption(serialGroup(*m_ui), t.ServerSerialOptions);
-    selectOption(tcpGroup(*m_ui), t.ServerTCPOptions);
-}
-
-void ServerOptionsDialog::accept()
-{
-    OptionsTransfer &t = OptionsTransfer::global();
-    t.AllowMultiConnect = checkValue(m_ui->chkMultiClients);
-    storeSelectedOption(tcpGroup(*m_ui), t.ServerTCPOptions);
-    storeSelectedOption(serialGroup(*m_ui), t.ServerSerialOptions);
-    QDialog::accept();
-}
-
-void ServerOptionsDialog::Command2_Click()
-{
-    OptionsTransfer::global().AllowMultiConnect = OptionsTransfer::kCancelled;
-    reject();
+    SessionOptions options = m_options;
+    options.AllowMultiConnect = checkValue(m_ui->chkMultiClients);
+    storeSelectedOption(tcpGroup(*m_ui), options.ServerTCPOptions);
+    storeSelectedOption(serialGroup(*m_ui), options.ServerSerialOptions);
+    return options;
 }
 
 void ServerOptionsDialog::keyPressEvent(QKeyEvent *event)
@@ -66,8 +55,10 @@ void ServerOptionsDialog::keyPressEvent(QKeyEvent *event)
         QDialog::keyPressEvent(event);
 }
 
-void showServerOptionsDialog(QWidget *parent)
+std::optional<SessionOptions> showServerOptionsDialog(QWidget *parent, const SessionOptions &options)
 {
-    ServerOptionsDialog dialog(parent);
-    dialog.exec();
+    ServerOptionsDialog dialog(options, parent);
+    if (dialog.exec() != QDialog::Accepted)
+        return std::nullopt;
+    return dialog.options();
 }

@@ -1,7 +1,6 @@
 #include "SessionEngine.h"
 
 #include "ErrorLog.h"
-#include "config/OptionsTransfer.h"
 #include "config/GlobalOptions.h"
 #include "localisation/ResourceStrings.h"
 #include "platform/SerialPortControl.h"
@@ -135,16 +134,6 @@ void SessionEngine::setSettingsLocked(bool locked)
         return;
     m_settingsLocked = locked;
     Q_EMIT settingsLockChanged(locked);
-}
-
-void SessionEngine::Getstatus() const
-{
-    copySessionOptions(m_record, OptionsTransfer::global());
-}
-
-void SessionEngine::UpdateStatus()
-{
-    copySessionOptions(OptionsTransfer::global(), m_record);
 }
 
 QStringList SessionEngine::connectedClientAddresses() const

@@ -71,10 +71,6 @@ public:
     void applyConfiguration(const SessionConfig &config);
     // The settings to save, with AutoActivate set while the session runs.
     SessionConfig currentConfiguration() const;
-    // Copy the routing options and login texts to / from the application's
-    // options transfer variables.
-    void Getstatus() const;
-    void UpdateStatus();
 
     // Remote addresses of the connected members, in index order.
     QStringList connectedClientAddresses() const;

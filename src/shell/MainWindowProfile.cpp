@@ -26,13 +26,12 @@ enum WindowStateValue { StateNormal = 0, StateMinimized = 1, StateMaximized = 2 
 void MainWindow::showSession(SessionEngine *session)
 {
     auto *window = new SessionWindow(session);
-    window->showIOOptionsDialog = [window](bool server) {
-        if (server)
-            showServerOptionsDialog(window);
-        else
-            showClientOptionsDialog(window);
+    window->showIOOptionsDialog = [window](bool server, const SessionOptions &options) {
+        return server ? showServerOptionsDialog(window, options) : showClientOptionsDialog(window, options);
     };
-    window->showLoginOptionsDialog = [window] { showLoginOptionsDialog(window); };
+    window->showLoginOptionsDialog = [window](const SessionOptions &options) {
+        return showLoginOptionsDialog(window, options);
+    };
     QMdiSubWindow *frame = m_ui->mdiArea->addSubWindow(window, Qt::SubWindow | Qt::WindowTitleHint
                                                           | Qt::WindowSystemMenuHint | Qt::WindowMinimizeButtonHint
                                                           | Qt::WindowCloseButtonHint);

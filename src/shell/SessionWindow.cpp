@@ -3,7 +3,7 @@
 
 #include "config/ConfigurationFile.h"
 #include "config/GlobalOptions.h"
-#include "config/OptionsTransfer.h"
+#include "config/SessionOptions.h"
 #include "localisation/ResourceStrings.h"
 #include "platform/LocalAddresses.h"
 #include "platform/SocketMember.h"
@@ -246,48 +246,19 @@ void SessionWindow::Combo2_EditTextChanged(const QString &text)
 
 void SessionWindow::Command2_Click()
 {
-    OptionsTransfer &t = OptionsTransfer::global();
-    SessionRecord &r = m_engine->record();
-    if (m_ui->TCPOption_1->isChecked()) {
-        t.AllowMultiConnect = r.AllowMultiConnect;
-        t.ServerSerialOptions = r.ServerSerialOptions;
-        t.ServerTCPOptions = r.ServerTCPOptions;
-        if (showIOOptionsDialog)
-            showIOOptionsDialog(true);
-        if (t.AllowMultiConnect == OptionsTransfer::kCancelled)
-            return;
-        r.AllowMultiConnect = t.AllowMultiConnect;
-        r.ServerSerialOptions = t.ServerSerialOptions;
-        r.ServerTCPOptions = t.ServerTCPOptions;
+    if (!showIOOptionsDialog)
         return;
-    }
-    t.ClientOptions = r.ClientOptions;
-    t.ConnectOnVirtualOpen = r.ConnectOnVirtualOpen;
-    if (showIOOptionsDialog)
-        showIOOptionsDialog(false);
-    if (t.ClientOptions == OptionsTransfer::kCancelled)
-        return;
-    r.ClientOptions = t.ClientOptions;
-    r.ConnectOnVirtualOpen = t.ConnectOnVirtualOpen;
+    const bool server = m_ui->TCPOption_1->isChecked();
+    if (const auto edited = showIOOptionsDialog(server, m_engine->currentConfiguration().options))
+        copySessionOptions(*edited, m_engine->record());
 }
 
 void SessionWindow::btnLogin_Click()
 {
-    OptionsTransfer &t = OptionsTransfer::global();
-    SessionRecord &r = m_engine->record();
-    t.UserPrompt = r.UserPrompt;
-    t.UserPromptResponse = r.UserPromptResponse;
-    t.PasswordPrompt = r.PasswordPrompt;
-    t.PasswordPromptResponse = r.PasswordPromptResponse;
-    t.LoginCancel = 0;
-    if (showLoginOptionsDialog)
-        showLoginOptionsDialog();
-    if (t.LoginCancel != 0)
+    if (!showLoginOptionsDialog)
         return;
-    r.UserPrompt = t.UserPrompt;
-    r.UserPromptResponse = t.UserPromptResponse;
-    r.PasswordPrompt = t.PasswordPrompt;
-    r.PasswordPromptResponse = t.PasswordPromptResponse;
+    if (const auto edited = showLoginOptionsDialog(m_engine->currentConfiguration().options))
+        copySessionOptions(*edited, m_engine->record());
 }
 
 void SessionWindow::Command3_Click()

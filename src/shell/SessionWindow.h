@@ -1,9 +1,12 @@
 #pragma once
 
+#include "config/SessionOptions.h"
+
 #include <QWidget>
 
 #include <functional>
 #include <memory>
+#include <optional>
 
 class QComboBox;
 class SessionEngine;
@@ -28,10 +31,10 @@ public:
     // The settings to save, with AutoActivate set while the session runs.
     SessionConfig currentConfiguration() const;
 
-    // The option dialogs are shown through these hooks; until a dialog is
-    // installed the values just pass through the options transfer variables.
-    std::function<void(bool server)> showIOOptionsDialog;
-    std::function<void()> showLoginOptionsDialog;
+    // The option dialogs are shown through these hooks: they take the
+    // session's options and return them edited, or nothing when cancelled.
+    std::function<std::optional<SessionOptions>(bool server, const SessionOptions &options)> showIOOptionsDialog;
+    std::function<std::optional<SessionOptions>(const SessionOptions &options)> showLoginOptionsDialog;
 
     // Handlers of the window's buttons, public so that other windows and
     // tests can invoke them like a click.

@@ -37,7 +37,7 @@ void saveFile(const QString &path, const Configuration &config, bool writePlacem
 QStringList describe(const SessionConfig &c)
 {
     const SessionSettings &s = c.settings;
-    const OptionsTransfer &o = c.options;
+    const SessionOptions &o = c.options;
     QStringList fields;
     for (int value : { s.Connector, s.BaudRate, s.Parity, s.Databits, s.Stopbits, s.FlowControl,
                        s.BufferSize, s.BufferSerialData, s.CreateVirtualPort, s.UseUDP, s.TCPOption,
@@ -87,7 +87,7 @@ SessionConfig sampleSession(int n)
     s.WaitForCr = 1;
     s.TimeoutValue = QStringLiteral("250");
     s.SessionDescription = QStringLiteral("Weighbridge %1 – 計量").arg(n);
-    OptionsTransfer &o = c.options;
+    SessionOptions &o = c.options;
     o.AllowMultiConnect = 0;
     o.ServerSerialOptions = 2;
     o.ServerTCPOptions = 1;

@@ -13,77 +13,74 @@ namespace {
 
 struct ClientOptionsDialogTest : ::testing::Test
 {
-    void setTransfer(int clientOptions, int connectOnVirtualOpen)
+    void give(int clientOptions, int connectOnVirtualOpen)
     {
-        OptionsTransfer &t = OptionsTransfer::global();
-        t.ClientOptions = clientOptions;
-        t.ConnectOnVirtualOpen = connectOnVirtualOpen;
+        given.ClientOptions = clientOptions;
+        given.ConnectOnVirtualOpen = connectOnVirtualOpen;
     }
-    void expectTransfer(int clientOptions, int connectOnVirtualOpen)
+    static void expectOptions(const SessionOptions &o, int clientOptions, int connectOnVirtualOpen)
     {
-        const OptionsTransfer &t = OptionsTransfer::global();
-        EXPECT_EQ(t.ClientOptions, clientOptions);
-        EXPECT_EQ(t.ConnectOnVirtualOpen, connectOnVirtualOpen);
+        EXPECT_EQ(o.ClientOptions, clientOptions);
+        EXPECT_EQ(o.ConnectOnVirtualOpen, connectOnVirtualOpen);
     }
 
-    TransferScope transfer;
+    SessionOptions given;
 };
 
-TEST_F(ClientOptionsDialogTest, OkStoresTheEditedValues)
+TEST_F(ClientOptionsDialogTest, OkReturnsTheEditedValues)
 {
-    setTransfer(2, 1);
+    give(2, 1);
     {
-        ClientOptionsDialog dialog;
+        ClientOptionsDialog dialog(given);
         dialog.show();
         clickControl(dialog, "Command1");
         EXPECT_EQ(dialog.result(), QDialog::Accepted);
         EXPECT_FALSE(dialog.isVisible());
-        expectTransfer(2, 1);
+        expectOptions(dialog.options(), 2, 1);
     }
-    setTransfer(0, 0);
+    give(0, 0);
     {
-        ClientOptionsDialog dialog;
+        ClientOptionsDialog dialog(given);
         dialog.show();
         clickControl(dialog, "Option1_1");
         clickControl(dialog, "chkConnectOnVirtualPort");
         clickControl(dialog, "Command1");
-        expectTransfer(1, 1);
+        expectOptions(dialog.options(), 1, 1);
     }
-    setTransfer(1, 1);
+    give(1, 1);
     {
-        ClientOptionsDialog dialog;
+        ClientOptionsDialog dialog(given);
         dialog.show();
         clickControl(dialog, "Option1_2");
         clickControl(dialog, "chkConnectOnVirtualPort");
         clickControl(dialog, "Command1");
-        expectTransfer(2, 0);
+        expectOptions(dialog.options(), 2, 0);
     }
-    setTransfer(4, 3);
+    give(4, 3);
     {
-        ClientOptionsDialog dialog;
+        ClientOptionsDialog dialog(given);
         dialog.accept();
-        expectTransfer(0, 0);
+        expectOptions(dialog.options(), 0, 0);
     }
 }
 
-TEST_F(ClientOptionsDialogTest, CancelMarksTheClientOptionsAndLeavesTheRest)
+TEST_F(ClientOptionsDialogTest, CancelRejects)
 {
-    setTransfer(2, 1);
-    ClientOptionsDialog dialog;
+    give(2, 1);
+    ClientOptionsDialog dialog(given);
     dialog.show();
     clickControl(dialog, "Option1_0");
     clickControl(dialog, "chkConnectOnVirtualPort");
     clickControl(dialog, "Command2");
     EXPECT_EQ(dialog.result(), QDialog::Rejected);
     EXPECT_FALSE(dialog.isVisible());
-    expectTransfer(OptionsTransfer::kCancelled, 1);
 }
 
 TEST_F(ClientOptionsDialogTest, EscPressesOkAndEnterOnlyAFocusedButton)
 {
-    setTransfer(0, 0);
+    give(0, 0);
     {
-        ClientOptionsDialog dialog;
+        ClientOptionsDialog dialog(given);
         dialog.show();
         EXPECT_FALSE(control<QPushButton>(dialog, u"Command1"_s)->isDefault());
         EXPECT_FALSE(control<QPushButton>(dialog, u"Command2"_s)->isDefault());
@@ -94,25 +91,23 @@ TEST_F(ClientOptionsDialogTest, EscPressesOkAndEnterOnlyAFocusedButton)
         QTest::keyClick(option, Qt::Key_Return);
         QTest::keyClick(option, Qt::Key_Enter);
         EXPECT_TRUE(dialog.isVisible());
-        expectTransfer(0, 0);
 
         // OK carries the cancel-button role here: Esc keeps the edit.
         QTest::keyClick(option, Qt::Key_Escape);
         EXPECT_FALSE(dialog.isVisible());
         EXPECT_EQ(dialog.result(), QDialog::Accepted);
-        expectTransfer(2, 0);
+        expectOptions(dialog.options(), 2, 0);
     }
-    setTransfer(1, 1);
+    give(1, 1);
     {
         // Enter on the focused Cancel button presses Cancel.
-        ClientOptionsDialog dialog;
+        ClientOptionsDialog dialog(given);
         dialog.show();
         auto *cancel = control<QPushButton>(dialog, u"Command2"_s);
         cancel->setFocus();
         QTest::keyClick(cancel, Qt::Key_Return);
         EXPECT_FALSE(dialog.isVisible());
         EXPECT_EQ(dialog.result(), QDialog::Rejected);
-        expectTransfer(OptionsTransfer::kCancelled, 1);
     }
 }
 

@@ -1,6 +1,6 @@
 #pragma once
 
-#include "config/OptionsTransfer.h"
+#include "config/SessionOptions.h"
 
 #include <QAbstractButton>
 #include <QCheckBox>
@@ -13,20 +13,6 @@
 #include <gtest/gtest.h>
 
 #include <optional>
-
-// Keeps the application-wide transfer variables of one test from leaking
-// into the next.
-class TransferScope
-{
-public:
-    TransferScope() : m_saved(OptionsTransfer::global()) {}
-    ~TransferScope() { OptionsTransfer::global() = m_saved; }
-    TransferScope(const TransferScope &) = delete;
-    TransferScope &operator=(const TransferScope &) = delete;
-
-private:
-    OptionsTransfer m_saved;
-};
 
 // A control of a form, found by its control name as tools and tests do.
 template <typename T> T *control(const QWidget &form, const QString &name)

@@ -19,18 +19,18 @@ const char *const kBoxes[] = { "txtUserPrompt", "txtUserPromptResponse", "txtPas
 
 struct LoginOptionsDialogTest : ::testing::Test
 {
-    void setTexts(const QStringList &texts)
+    static SessionOptions withTexts(const QStringList &texts)
     {
-        OptionsTransfer &t = OptionsTransfer::global();
-        t.UserPrompt = texts.value(0);
-        t.UserPromptResponse = texts.value(1);
-        t.PasswordPrompt = texts.value(2);
-        t.PasswordPromptResponse = texts.value(3);
+        SessionOptions options;
+        options.UserPrompt = texts.value(0);
+        options.UserPromptResponse = texts.value(1);
+        options.PasswordPrompt = texts.value(2);
+        options.PasswordPromptResponse = texts.value(3);
+        return options;
     }
-    QStringList transferTexts() const
+    static QStringList textsOf(const SessionOptions &o)
     {
-        const OptionsTransfer &t = OptionsTransfer::global();
-        return { t.UserPrompt, t.UserPromptResponse, t.PasswordPrompt, t.PasswordPromptResponse };
+        return { o.UserPrompt, o.UserPromptResponse, o.PasswordPrompt, o.PasswordPromptResponse };
     }
     QStringList shownTexts(const QWidget &dialog) const
     {
@@ -47,11 +47,10 @@ struct LoginOptionsDialogTest : ::testing::Test
         QTest::keyClicks(box, text);
     }
 
-    TransferScope transfer;
     const QStringList defaults{ u"Username:"_s, QString(), u"Password:"_s, QString() };
 };
 
-TEST_F(LoginOptionsDialogTest, OkStoresTheTextsExactlyAndClearsTheCancelFlag)
+TEST_F(LoginOptionsDialogTest, OkReturnsTheTextsExactly)
 {
     struct Row
     {
@@ -64,49 +63,36 @@ TEST_F(LoginOptionsDialogTest, OkStoresTheTextsExactlyAndClearsTheCancelFlag)
     };
     for (const Row &row : rows) {
         SCOPED_TRACE(row.label);
-        setTexts(defaults);
-        OptionsTransfer::global().LoginCancel = -1;
-        LoginOptionsDialog dialog;
+        LoginOptionsDialog dialog(withTexts(defaults));
         dialog.show();
+        EXPECT_EQ(shownTexts(dialog), defaults);
         for (int index = 0; index < 4; ++index)
             retype(dialog, kBoxes[index], row.typed[index]);
         clickControl(dialog, "btnOK");
         EXPECT_EQ(dialog.result(), QDialog::Accepted);
         EXPECT_FALSE(dialog.isVisible());
-        EXPECT_EQ(transferTexts(), row.typed);
-        EXPECT_EQ(OptionsTransfer::global().LoginCancel, 0);
+        EXPECT_EQ(textsOf(dialog.options()), row.typed);
     }
 }
 
-TEST_F(LoginOptionsDialogTest, CancelAndTheWindowFrameLeaveTheTextsAsPassedIn)
+TEST_F(LoginOptionsDialogTest, CancelAndTheWindowFrameReject)
 {
-    setTexts(defaults);
-    {
-        LoginOptionsDialog dialog;
+    for (const bool frame : { false, true }) {
+        LoginOptionsDialog dialog(withTexts(defaults));
         dialog.show();
         retype(dialog, "txtUserPrompt", u"changed"_s);
-        clickControl(dialog, "btnCancel");
+        if (frame)
+            EXPECT_TRUE(dialog.close());
+        else
+            clickControl(dialog, "btnCancel");
         EXPECT_FALSE(dialog.isVisible());
-        EXPECT_EQ(transferTexts(), defaults);
-        EXPECT_EQ(OptionsTransfer::global().LoginCancel, -1);
-    }
-    // The frame sets no flag: the last one stays, whichever it was.
-    for (int lastFlag : { -1, 0 }) {
-        OptionsTransfer::global().LoginCancel = lastFlag;
-        LoginOptionsDialog dialog;
-        dialog.show();
-        retype(dialog, "txtPasswordPromptResponse", u"changed"_s);
-        EXPECT_TRUE(dialog.close());
-        EXPECT_EQ(transferTexts(), defaults);
-        EXPECT_EQ(OptionsTransfer::global().LoginCancel, lastFlag);
+        EXPECT_EQ(dialog.result(), QDialog::Rejected);
     }
 }
 
 TEST_F(LoginOptionsDialogTest, EnterAndEscAreBoundToNeitherButton)
 {
-    setTexts(defaults);
-    OptionsTransfer::global().LoginCancel = 0;
-    LoginOptionsDialog dialog;
+    LoginOptionsDialog dialog(withTexts(defaults));
     dialog.show();
     auto *box = control<QLineEdit>(dialog, u"txtUserPrompt"_s);
     box->setFocus();
@@ -115,15 +101,13 @@ TEST_F(LoginOptionsDialogTest, EnterAndEscAreBoundToNeitherButton)
     QTest::keyClick(box, Qt::Key_Return);
     QTest::keyClick(box, Qt::Key_Escape);
     EXPECT_TRUE(dialog.isVisible());
-    EXPECT_EQ(transferTexts(), defaults);
 
     // A focused button takes Enter as a click.
     auto *cancel = control<QPushButton>(dialog, u"btnCancel"_s);
     cancel->setFocus();
     QTest::keyClick(cancel, Qt::Key_Return);
     EXPECT_FALSE(dialog.isVisible());
-    EXPECT_EQ(OptionsTransfer::global().LoginCancel, -1);
-    EXPECT_EQ(transferTexts(), defaults);
+    EXPECT_EQ(dialog.result(), QDialog::Rejected);
 }
 
 } // namespace

@@ -13,71 +13,69 @@ namespace {
 
 struct ServerOptionsDialogTest : ::testing::Test
 {
-    void setTransfer(int multi, int serial, int tcp)
+    void give(int multi, int serial, int tcp)
     {
-        OptionsTransfer &t = OptionsTransfer::global();
-        t.AllowMultiConnect = multi;
-        t.ServerSerialOptions = serial;
-        t.ServerTCPOptions = tcp;
+        given.AllowMultiConnect = multi;
+        given.ServerSerialOptions = serial;
+        given.ServerTCPOptions = tcp;
     }
-    void expectTransfer(int multi, int serial, int tcp)
+    static void expectOptions(const SessionOptions &o, int multi, int serial, int tcp)
     {
-        const OptionsTransfer &t = OptionsTransfer::global();
-        EXPECT_EQ(t.AllowMultiConnect, multi);
-        EXPECT_EQ(t.ServerSerialOptions, serial);
-        EXPECT_EQ(t.ServerTCPOptions, tcp);
+        EXPECT_EQ(o.AllowMultiConnect, multi);
+        EXPECT_EQ(o.ServerSerialOptions, serial);
+        EXPECT_EQ(o.ServerTCPOptions, tcp);
     }
 
-    TransferScope transfer;
+    SessionOptions given;
 };
 
-TEST_F(ServerOptionsDialogTest, OkStoresTheEditedValues)
+TEST_F(ServerOptionsDialogTest, OkReturnsTheEditedValues)
 {
     // Unchanged: the same three values come back.
-    setTransfer(1, 2, 1);
+    give(1, 2, 1);
     {
-        ServerOptionsDialog dialog;
+        ServerOptionsDialog dialog(given);
         dialog.show();
         clickControl(dialog, "Command1");
         EXPECT_EQ(dialog.result(), QDialog::Accepted);
         EXPECT_FALSE(dialog.isVisible());
-        expectTransfer(1, 2, 1);
+        expectOptions(dialog.options(), 1, 2, 1);
     }
     // "Ignore" is option 1 and "first connected client" option 2 in each
     // group; the groups do not clear each other, and unchecking stores 0.
-    setTransfer(1, 0, 0);
+    give(1, 0, 0);
     {
-        ServerOptionsDialog dialog;
+        ServerOptionsDialog dialog(given);
         dialog.show();
         clickControl(dialog, "OptionSerial_1");
         clickControl(dialog, "OptionTCP_2");
         clickControl(dialog, "chkMultiClients");
         clickControl(dialog, "Command1");
-        expectTransfer(0, 1, 2);
+        expectOptions(dialog.options(), 0, 1, 2);
     }
-    setTransfer(0, 1, 2);
+    give(0, 1, 2);
     {
-        ServerOptionsDialog dialog;
+        ServerOptionsDialog dialog(given);
         dialog.show();
         clickControl(dialog, "OptionSerial_2");
         clickControl(dialog, "OptionTCP_1");
         clickControl(dialog, "chkMultiClients");
         clickControl(dialog, "Command1");
-        expectTransfer(1, 2, 1);
+        expectOptions(dialog.options(), 1, 2, 1);
     }
     // Values the dialog could not show come back as what it showed.
-    setTransfer(5, 9, -3);
+    give(5, 9, -3);
     {
-        ServerOptionsDialog dialog;
+        ServerOptionsDialog dialog(given);
         dialog.accept();
-        expectTransfer(0, 0, 0);
+        expectOptions(dialog.options(), 0, 0, 0);
     }
 }
 
-TEST_F(ServerOptionsDialogTest, CancelMarksTheMultiClientValueAndLeavesTheRest)
+TEST_F(ServerOptionsDialogTest, CancelRejects)
 {
-    setTransfer(1, 2, 1);
-    ServerOptionsDialog dialog;
+    give(1, 2, 1);
+    ServerOptionsDialog dialog(given);
     dialog.show();
     clickControl(dialog, "OptionSerial_0");
     clickControl(dialog, "OptionTCP_0");
@@ -85,14 +83,13 @@ TEST_F(ServerOptionsDialogTest, CancelMarksTheMultiClientValueAndLeavesTheRest)
     clickControl(dialog, "Command2");
     EXPECT_EQ(dialog.result(), QDialog::Rejected);
     EXPECT_FALSE(dialog.isVisible());
-    expectTransfer(OptionsTransfer::kCancelled, 2, 1);
 }
 
 TEST_F(ServerOptionsDialogTest, EscPressesCancelAndEnterOnlyAFocusedButton)
 {
-    setTransfer(0, 1, 1);
+    give(0, 1, 1);
     {
-        ServerOptionsDialog dialog;
+        ServerOptionsDialog dialog(given);
         dialog.show();
         auto *ok = control<QPushButton>(dialog, u"Command1"_s);
         auto *cancel = control<QPushButton>(dialog, u"Command2"_s);
@@ -106,17 +103,15 @@ TEST_F(ServerOptionsDialogTest, EscPressesCancelAndEnterOnlyAFocusedButton)
         QTest::keyClick(option, Qt::Key_Return);
         QTest::keyClick(option, Qt::Key_Enter);
         EXPECT_TRUE(dialog.isVisible());
-        expectTransfer(0, 1, 1);
 
         QTest::keyClick(option, Qt::Key_Escape);
         EXPECT_FALSE(dialog.isVisible());
         EXPECT_EQ(dialog.result(), QDialog::Rejected);
-        expectTransfer(OptionsTransfer::kCancelled, 1, 1);
     }
-    setTransfer(0, 1, 1);
+    give(0, 1, 1);
     {
         // Enter on the focused OK button presses it.
-        ServerOptionsDialog dialog;
+        ServerOptionsDialog dialog(given);
         dialog.show();
         clickControl(dialog, "OptionSerial_2");
         auto *ok = control<QPushButton>(dialog, u"Command1"_s);
@@ -124,7 +119,7 @@ TEST_F(ServerOptionsDialogTest, EscPressesCancelAndEnterOnlyAFocusedButton)
         QTest::keyClick(ok, Qt::Key_Return);
         EXPECT_FALSE(dialog.isVisible());
         EXPECT_EQ(dialog.result(), QDialog::Accepted);
-        expectTransfer(0, 2, 1);
+        expectOptions(dialog.options(), 0, 2, 1);
     }
 }
 

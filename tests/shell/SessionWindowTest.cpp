@@ -1,5 +1,5 @@
 #include "config/GlobalOptions.h"
-#include "config/OptionsTransfer.h"
+#include "config/SessionOptions.h"
 #include "session/SessionEngine.h"
 #include "shell/SessionWindow.h"
 #include "viewsupport/UserDialogs.h"
@@ -238,24 +238,23 @@ TEST_F(SessionWindowTest, StatusLinesAndLockFollowTheEngine)
     EXPECT_EQ(child<QComboBox>("Combo1_3")->currentText(), QStringLiteral("2"));
 }
 
-TEST_F(SessionWindowTest, IOOptionsPassThroughTheTransferVariablesUnlessCancelled)
+TEST_F(SessionWindowTest, IOOptionsTakeTheDialogsValueUnlessCancelled)
 {
-    OptionsTransfer &t = OptionsTransfer::global();
-    window.showIOOptionsDialog = [&](bool server) {
+    window.showIOOptionsDialog = [&](bool server, SessionOptions options) -> std::optional<SessionOptions> {
         EXPECT_FALSE(server);
-        EXPECT_EQ(t.ConnectOnVirtualOpen, 1);
-        t.ClientOptions = 2;
-        t.ConnectOnVirtualOpen = 0;
+        EXPECT_EQ(options.ConnectOnVirtualOpen, 1);
+        options.ClientOptions = 2;
+        options.ConnectOnVirtualOpen = 0;
+        return options;
     };
     window.Command2_Click();
     EXPECT_EQ(engine.record().ClientOptions, 2);
     EXPECT_EQ(engine.record().ConnectOnVirtualOpen, 0);
 
     child<QRadioButton>("TCPOption_1")->click();
-    window.showIOOptionsDialog = [&](bool server) {
+    window.showIOOptionsDialog = [&](bool server, const SessionOptions &) -> std::optional<SessionOptions> {
         EXPECT_TRUE(server);
-        t.AllowMultiConnect = OptionsTransfer::kCancelled;
-        t.ServerSerialOptions = 2;
+        return std::nullopt;
     };
     window.Command2_Click();
     EXPECT_EQ(engine.record().AllowMultiConnect, 1);

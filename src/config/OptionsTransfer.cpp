@@ -1,7 +1,0 @@
-#include "OptionsTransfer.h"
-
-OptionsTransfer &OptionsTransfer::global()
-{
-    static OptionsTransfer transfer;
-    return transfer;
-}
