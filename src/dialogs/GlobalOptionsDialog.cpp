@@ -54,7 +54,7 @@ const QString kProgramFilter = QStringLiteral("All Files (*)");
 
 } // namespace
 
-GlobalOptionsDialog::GlobalOptionsDialog(QWidget *parent)
+GlobalOptionsDialog::GlobalOptionsDialog(const GlobalOptions &options, QWidget *parent)
     : QDialog(parent), m_ui(std::make_unique<Ui::GlobalOptionsDialog>())
 {
     m_ui->setupUi(this);
@@ -68,7 +68,7 @@ GlobalOptionsDialog::GlobalOptionsDialog(QWidget *parent)
     connect(m_ui->Command3, &QPushButton::clicked, this, &GlobalOptionsDialog::reject);
 
     fillLists();
-    loadGlobalOptions();
+    showOptions(options);
 }
 
 GlobalOptionsDialog::~GlobalOptionsDialog() = default;
@@ -80,9 +80,9 @@ void GlobalOptionsDialog::fillLists()
     m_ui->Combo3->addItems(pingTimeoutEntries());
 }
 
-void GlobalOptionsDialog::loadGlobalOptions()
+void GlobalOptionsDialog::showOptions(const GlobalOptions &o)
 {
-    const GlobalOptions &o = GlobalOptions::global();
+    m_options = o;
     m_ui->Text1->setText(o.OnErrorRunApp);
     showCheckValue(m_ui->Check1, o.LogErrors);
     // As text, so a size that is not in the list shows as it was typed.
@@ -93,9 +93,9 @@ void GlobalOptionsDialog::loadGlobalOptions()
     showCheckValue(m_ui->chkLoadWithWindows, o.LoadWithWindows);
 }
 
-void GlobalOptionsDialog::accept()
+GlobalOptions GlobalOptionsDialog::options() const
 {
-    GlobalOptions &o = GlobalOptions::global();
+    GlobalOptions o = m_options;
     o.OnErrorRunApp = m_ui->Text1->text();
     o.LogErrors = checkValue(m_ui->Check1);
     o.PacketSize = packetSizeFromText(m_ui->Combo1->currentText());
@@ -103,7 +103,7 @@ void GlobalOptionsDialog::accept()
     storeListIndex(m_ui->Combo2, o.PingFrequency);
     storeListIndex(m_ui->Combo3, o.PingTimeout);
     o.LoadWithWindows = checkValue(m_ui->chkLoadWithWindows);
-    QDialog::accept();
+    return o;
 }
 
 void GlobalOptionsDialog::Command1_Click()
@@ -117,8 +117,10 @@ void GlobalOptionsDialog::Command1_Click()
         m_ui->Text1->setText(*file);
 }
 
-void showGlobalOptionsDialog(QWidget *parent)
+std::optional<GlobalOptions> showGlobalOptionsDialog(QWidget *parent, const GlobalOptions &options)
 {
-    GlobalOptionsDialog dialog(parent);
-    dialog.exec();
+    GlobalOptionsDialog dialog(options, parent);
+    if (dialog.exec() != QDialog::Accepted)
+        return std::nullopt;
+    return dialog.options();
 }

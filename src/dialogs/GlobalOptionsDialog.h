@@ -1,18 +1,19 @@
 #pragma once
 
+#include "config/GlobalOptions.h"
+
 #include <QDialog>
 
 #include <memory>
+#include <optional>
 
 namespace Ui { class GlobalOptionsDialog; }
 
-// frmOptions: edits the application-wide options in GlobalOptions::global()
-// (packet size, start with the desktop session, error log, error program,
-// ping watchdog). It reads them when it is created and writes them only on
-// accept() (OK, or Enter: OK is the default button); Cancel, Esc and closing
-// by the window frame change nothing. It writes nothing to disk: the values
-// reach the configuration file, and the autostart entry, with the next
-// configuration save.
+// frmOptions: edits the application-wide options (packet size, start at
+// login, error log, error program, ping watchdog), given as a value. OK (or
+// Enter: OK is the default button) accepts; Cancel, Esc and closing by the
+// window frame reject. It writes nothing to disk: the values reach the
+// configuration file, and the autostart entry, with the next save.
 //
 // A ping frequency or time-out index outside its list (a hand-edited
 // configuration file) shows as no selection and is kept on OK unless the
@@ -21,20 +22,20 @@ class GlobalOptionsDialog : public QDialog
 {
     Q_OBJECT
 public:
-    explicit GlobalOptionsDialog(QWidget *parent = nullptr);
+    explicit GlobalOptionsDialog(const GlobalOptions &options, QWidget *parent = nullptr);
     ~GlobalOptionsDialog() override;
 
-    // Stores the edited values, then closes; QDialog::accepted() is emitted
-    // after the options hold their new values.
-    void accept() override;
+    // The options as edited (the password as given).
+    GlobalOptions options() const;
 
 private:
     void fillLists();
-    void loadGlobalOptions();
+    void showOptions(const GlobalOptions &options);
     void Command1_Click();
 
     std::unique_ptr<Ui::GlobalOptionsDialog> m_ui;
+    GlobalOptions m_options;
 };
 
-// Shows the dialog modally and returns once it is closed.
-void showGlobalOptionsDialog(QWidget *parent);
+// Shows the dialog modally; the edited options, or nothing when cancelled.
+std::optional<GlobalOptions> showGlobalOptionsDialog(QWidget *parent, const GlobalOptions &options);

@@ -60,7 +60,10 @@ void MainWindow::wireMenus()
 void MainWindow::wireDialogs()
 {
     connect(m_ui->mnuOptions_0, &QAction::triggered, this, [this] {
-        showGlobalOptionsDialog(this);
+        const auto edited = showGlobalOptionsDialog(this, GlobalOptions::global());
+        if (!edited)
+            return;
+        GlobalOptions::global() = *edited;
         // A watchdog switched on must start counting in resting sessions.
         for (SessionWindow *window : sessionWindows())
             window->engine()->wakeTicks();

@@ -47,6 +47,17 @@ void expectOptions(const GlobalOptions &expected)
     EXPECT_EQ(o.LoadWithWindows, expected.LoadWithWindows);
 }
 
+// The dialog as the main window uses it: it shows the global options and
+// OK puts its value back into them.
+class OptionsDialog : public GlobalOptionsDialog
+{
+public:
+    OptionsDialog() : GlobalOptionsDialog(GlobalOptions::global())
+    {
+        QObject::connect(this, &QDialog::accepted, this, [this] { GlobalOptions::global() = options(); });
+    }
+};
+
 // The global options and the file box answer of one test stay in that test.
 class GlobalOptionsDialogTest : public ::testing::Test
 {
@@ -119,7 +130,7 @@ TEST_F(GlobalOptionsDialogTest, UnknownListIndexesShowNoSelectionAndSurviveOkUnl
         options.PingTimeout = row.timeout;
         GlobalOptions::global() = options;
 
-        GlobalOptionsDialog dialog;
+        OptionsDialog dialog;
         EXPECT_EQ(list(dialog, "Combo2")->currentIndex(), -1);
         EXPECT_EQ(list(dialog, "Combo2")->currentText(), QString());
         EXPECT_EQ(list(dialog, "Combo3")->currentIndex(), -1);
@@ -132,7 +143,7 @@ TEST_F(GlobalOptionsDialogTest, UnknownListIndexesShowNoSelectionAndSurviveOkUnl
     options.PingFrequency = 20;
     options.PingTimeout = 25;
     GlobalOptions::global() = options;
-    GlobalOptionsDialog dialog;
+    OptionsDialog dialog;
     dialog.show();
     QComboBox *frequency = list(dialog, "Combo2");
     QTest::keyClick(frequency, Qt::Key_Down);
@@ -148,7 +159,7 @@ TEST_F(GlobalOptionsDialogTest, OkStoresEveryControlAndReopeningShowsTheTypedPac
 {
     GlobalOptions::global() = someOptions();
     {
-        GlobalOptionsDialog dialog;
+        OptionsDialog dialog;
         dialog.show();
         editEveryControl(dialog);
         clickControl(dialog, "Command2");
@@ -165,7 +176,7 @@ TEST_F(GlobalOptionsDialogTest, OkStoresEveryControlAndReopeningShowsTheTypedPac
     edited.PingTimeout = 19;
     expectOptions(edited);
 
-    GlobalOptionsDialog reopened;
+    OptionsDialog reopened;
     EXPECT_EQ(list(reopened, "Combo1")->currentText(), u"700"_s);
 }
 
@@ -185,7 +196,7 @@ TEST_F(GlobalOptionsDialogTest, TypedPacketSizesOutsideOneTo10000Become2000)
     for (const Row &row : rows) {
         SCOPED_TRACE(row.typed);
         GlobalOptions::global() = someOptions();
-        GlobalOptionsDialog dialog;
+        OptionsDialog dialog;
         dialog.show();
         typePacketSize(dialog, QString::fromLatin1(row.typed));
         EXPECT_EQ(list(dialog, "Combo1")->currentText(), QString::fromLatin1(row.typed));
@@ -195,7 +206,7 @@ TEST_F(GlobalOptionsDialogTest, TypedPacketSizesOutsideOneTo10000Become2000)
         EXPECT_EQ(list(dialog, "Combo1")->count(), 7);
     }
     // Picked from the list.
-    GlobalOptionsDialog dialog;
+    OptionsDialog dialog;
     list(dialog, "Combo1")->setCurrentIndex(3);
     dialog.accept();
     EXPECT_EQ(GlobalOptions::global().PacketSize, 500);
@@ -204,7 +215,7 @@ TEST_F(GlobalOptionsDialogTest, TypedPacketSizesOutsideOneTo10000Become2000)
 TEST_F(GlobalOptionsDialogTest, BrowsePutsTheChosenPathInTheCommandLineAndCancelKeepsIt)
 {
     GlobalOptions::global() = someOptions();
-    GlobalOptionsDialog dialog;
+    OptionsDialog dialog;
     dialog.show();
 
     // Cancelled, or no name: the command line stays.
@@ -228,7 +239,7 @@ TEST_F(GlobalOptionsDialogTest, BrowsePutsTheChosenPathInTheCommandLineAndCancel
     // Browsing is editing: Cancel drops it, OK stores it.
     clickControl(dialog, "Command3");
     expectOptions(someOptions());
-    GlobalOptionsDialog second;
+    OptionsDialog second;
     second.show();
     clickControl(second, "Command1");
     clickControl(second, "Command2");
@@ -246,7 +257,7 @@ TEST_F(GlobalOptionsDialogTest, OnlyOkStoresAndEnterInATextBoxPressesIt)
     for (const auto &close : closers) {
         SCOPED_TRACE(way++);
         GlobalOptions::global() = someOptions();
-        GlobalOptionsDialog dialog;
+        OptionsDialog dialog;
         dialog.show();
         editEveryControl(dialog);
         close(dialog);
@@ -255,7 +266,7 @@ TEST_F(GlobalOptionsDialogTest, OnlyOkStoresAndEnterInATextBoxPressesIt)
         expectOptions(someOptions());
     }
 
-    GlobalOptionsDialog dialog;
+    OptionsDialog dialog;
     dialog.show();
     EXPECT_TRUE(control<QPushButton>(dialog, u"Command2"_s)->isDefault());
     commandLine(dialog)->setText(u"/bin/false"_s);
@@ -265,7 +276,7 @@ TEST_F(GlobalOptionsDialogTest, OnlyOkStoresAndEnterInATextBoxPressesIt)
 
     // Enter in the packet-size box neither adds the typed size to the list
     // nor stops there.
-    GlobalOptionsDialog second;
+    OptionsDialog second;
     second.show();
     typePacketSize(second, u"3000"_s);
     QTest::keyClick(list(second, "Combo1")->lineEdit(), Qt::Key_Enter);
