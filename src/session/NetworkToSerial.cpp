@@ -29,9 +29,9 @@ void SessionEngine::DataArrival(int index)
     m_record.PingTicks = 0;
     setLamp(1, true);
 
-    const bool networkIgnored = (isServer() && m_record.ServerTCPOptions == 1)
-        || (!isServer() && m_record.ClientOptions == 1);
-    const bool notFirstClient = !m_record.UseUDP && isServer() && m_record.ServerTCPOptions == 2
+    const bool networkIgnored = isServer() ? networkRouting() == ClientRouting::Ignore
+                                           : clientDirection() == ClientDirection::NoSerialOutput;
+    const bool notFirstClient = !m_record.UseUDP && isServer() && networkRouting() == ClientRouting::FirstClient
         && index != firstConnectedIndex();
     if (networkIgnored || notFirstClient) {
         member->getData();

@@ -36,7 +36,7 @@ bool SessionEngine::anyConnected() const
 // client to serve with "first client only".
 QList<int> SessionEngine::serialReceivers() const
 {
-    if (isServer() && m_record.ServerSerialOptions == 2) {
+    if (isServer() && serialRouting() == ClientRouting::FirstClient) {
         const int first = firstClientToServe();
         return first >= 0 ? QList<int> { first } : QList<int> {};
     }
@@ -142,7 +142,8 @@ void SessionEngine::sendHeldData(bool packetMode, bool mayHold)
 
 bool SessionEngine::serialInputIgnored() const
 {
-    return (isServer() && m_record.ServerSerialOptions == 1) || (!isServer() && m_record.ClientOptions == 2);
+    return isServer() ? serialRouting() == ClientRouting::Ignore
+                      : clientDirection() == ClientDirection::NoNetworkOutput;
 }
 
 void SessionEngine::moveSerialInput(const std::function<qint64()> &pending,

@@ -180,6 +180,9 @@ private:
     void wireSocket(SocketMember *member);
     bool anyConnected() const;
     bool isServer() const { return m_record.TCPOption == 1; }
+    ClientRouting serialRouting() const { return routingOption<ClientRouting>(m_record.ServerSerialOptions); }
+    ClientRouting networkRouting() const { return routingOption<ClientRouting>(m_record.ServerTCPOptions); }
+    ClientDirection clientDirection() const { return routingOption<ClientDirection>(m_record.ClientOptions); }
     int portNumberValue() const;
     void showClientCount();
 

@@ -2,7 +2,21 @@
 
 #include <QString>
 
-// Run-time state of one session, alive as long as its window.
+// Which clients of a server session a direction serves: all of them, none
+// (the data is dropped on purpose), or only the first connected one.
+enum class ClientRouting { AllClients = 0, Ignore = 1, FirstClient = 2 };
+// What a client session carries: both ways, or one direction dropped.
+enum class ClientDirection { BothWays = 0, NoSerialOutput = 1, NoNetworkOutput = 2 };
+
+// The stored number of a routing option as its meaning; a number no option
+// has means the first option, as it always did.
+template <typename Option>
+Option routingOption(int stored)
+{
+    return stored == 1 || stored == 2 ? Option(stored) : Option(0);
+}
+
+// Run-time state of one session, alive as long as the session.
 struct SessionRecord
 {
     bool UseUDP = false;
@@ -12,9 +26,9 @@ struct SessionRecord
     QString PasswordPrompt;
     QString PasswordPromptResponse;
     int AllowMultiConnect = 1;
-    int ServerSerialOptions = 0; // 0 all clients, 1 none, 2 first client
-    int ServerTCPOptions = 0;    // 0 all, 1 none, 2 first client
-    int ClientOptions = 0;       // 0 two-way, 1 no serial output, 2 no network output
+    int ServerSerialOptions = 0; // ClientRouting of serial data
+    int ServerTCPOptions = 0;    // ClientRouting of network data
+    int ClientOptions = 0;       // ClientDirection
     int ConnectOnVirtualOpen = 1;
     int ComPortNumber = 0;
     QString LocalIPAddress;
