@@ -11,8 +11,6 @@ class SerialPortControl : public QObject
 {
     Q_OBJECT
 public:
-    // Values of commEvent(): only "data received" means anything to callers.
-    static constexpr int kCommEventReceive = 2;
     // Handshaking values.
     enum Handshaking { NoHandshaking = 0, XonXoff = 1, RtsCts = 2 };
 
@@ -29,7 +27,6 @@ public:
     virtual QString settings() const = 0;
     virtual void setHandshaking(int handshaking) = 0;
     virtual int handshaking() const = 0;
-    virtual void setFlowControlFlag(bool on) = 0;
     virtual void setInBufferSize(int bytes) = 0;
     virtual void setOutBufferSize(int bytes) = 0;
 
@@ -40,8 +37,6 @@ public:
     virtual bool isOpen() const = 0;
     virtual QString errorString() const = 0;
 
-    // What raised the last commEvent signal (kCommEventReceive for data).
-    virtual int commEvent() const = 0;
     virtual qint64 inBufferCount() const = 0;
     virtual void discardInput() = 0;
     // Takes up to maxBytes received bytes (all of them when maxBytes < 0).
@@ -53,7 +48,7 @@ public:
     virtual void output(const QByteArray &bytes) = 0;
 
 Q_SIGNALS:
-    // Raised when data has arrived (commEvent() tells what happened).
+    // Raised when data has arrived.
     void commEventRaised();
     // Queued bytes went out to the device: the transmit queue has room.
     void outputWritten();

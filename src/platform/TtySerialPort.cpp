@@ -197,7 +197,6 @@ void TtySerialPort::output(const QByteArray &bytes)
 
 void TtySerialPort::handleReadyRead()
 {
-    m_commEvent = kCommEventReceive;
     Q_EMIT commEventRaised();
 }
 

@@ -22,7 +22,6 @@ public:
     QString settings() const override;
     void setHandshaking(int handshaking) override;
     int handshaking() const override { return m_handshaking; }
-    void setFlowControlFlag(bool on) override { m_flowControlFlag = on; }
     void setInBufferSize(int bytes) override;
     void setOutBufferSize(int bytes) override;
 
@@ -31,7 +30,6 @@ public:
     bool isOpen() const override { return m_port.isOpen(); }
     QString errorString() const override { return m_errorString; }
 
-    int commEvent() const override { return m_commEvent; }
     qint64 inBufferCount() const override;
     void discardInput() override;
     QByteArray input(qint64 maxBytes = -1) override;
@@ -52,8 +50,6 @@ private:
     int m_portNumber = 1;
     SerialLineSettings m_lineSettings;
     int m_handshaking = NoHandshaking;
-    bool m_flowControlFlag = true;
     int m_outBufferSize = 8192;
-    int m_commEvent = 0;
     QString m_errorString;
 };

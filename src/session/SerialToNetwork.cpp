@@ -178,8 +178,6 @@ void SessionEngine::SerialReceive()
         return;
     }
     const bool connected = anyConnected();
-    if (m_serialPort->commEvent() != SerialPortControl::kCommEventReceive)
-        return;
     const bool mayHold = m_settings.BufferSerialData != 0;
     if (!m_record.UseUDP && !mayHold && !connected) {
         m_serialPort->discardInput();

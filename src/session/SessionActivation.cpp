@@ -18,17 +18,10 @@ constexpr int kNetworkCaption = 5091;
 
 // Flow-control entry -> handshaking value, and whether the flow-control flag
 // is set (Opto-RS is hardware handshaking with the flag cleared).
-struct FlowControlMapping
-{
-    int handshaking;
-    bool flag;
-};
-constexpr FlowControlMapping kFlowControl[] = {
-    { SerialPortControl::NoHandshaking, true },
-    { SerialPortControl::XonXoff, true },
-    { SerialPortControl::RtsCts, true },
-    { SerialPortControl::RtsCts, false },
-};
+// Handshaking by flow-control entry: None, Xon/Xoff, Hardware, Opto-RS (which
+// is hardware handshaking too).
+constexpr int kHandshaking[] = { SerialPortControl::NoHandshaking, SerialPortControl::XonXoff,
+                                 SerialPortControl::RtsCts, SerialPortControl::RtsCts };
 
 QString listEntry(const QStringList &entries, int index)
 {
@@ -189,15 +182,7 @@ bool SessionEngine::openPhysicalPort()
         failSerialOpen(m_serialPort->errorString());
         return false;
     }
-    const int flowEntry = qBound(0, m_settings.FlowControl, 3);
-    const FlowControlMapping flow = kFlowControl[flowEntry];
-    if (flow.flag) {
-        m_serialPort->setFlowControlFlag(true);
-        m_serialPort->setHandshaking(flow.handshaking);
-    } else {
-        m_serialPort->setHandshaking(flow.handshaking);
-        m_serialPort->setFlowControlFlag(false);
-    }
+    m_serialPort->setHandshaking(kHandshaking[qBound(0, m_settings.FlowControl, 3)]);
     m_serialPort->setInBufferSize(kSerialQueueSize);
     m_serialPort->setOutBufferSize(kSerialQueueSize);
     if (!sizeBuffers())

@@ -52,7 +52,6 @@ public:
     SessionManager *manager() const { return m_manager; }
     bool hasShutDown() const { return m_shutDown; }
     QString currentConfigFile() const { return m_currentConfigFile; }
-    bool trayIconAdded() const { return m_trayIcon != nullptr; }
 
     // Asks for the password before the window is shown again; replaced by
     // tests. Returns the entry, or nothing when the user cancelled.
