@@ -13,9 +13,9 @@ int SessionEngine::firstConnectedIndex() const
 {
     // A client that has stopped sending has nothing more to write; it must
     // not keep the next client's data out.
-    for (int i = 1; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
-        const SocketMember *member = m_sockets[size_t(i)];
-        if (member->state() == SocketMember::StateConnected && !member->isHalfClosed())
+    // Member 0 listens in the server role, so the clients start at 1.
+    for (const int i : connectedMembers()) {
+        if (i >= 1 && !m_sockets[size_t(i)]->isHalfClosed())
             return i;
     }
     return m_record.MaxSocketIndex + 1;

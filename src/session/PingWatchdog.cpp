@@ -32,10 +32,8 @@ void SessionEngine::pingWatchdogStep()
     if (m_pingsInFlight > 0)
         return;
     PingTimeoutMs = PingTimeoutMsFor(options.PingTimeout);
-    for (int i = 0; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
+    for (const int i : connectedMembers()) {
         SocketMember *member = socket(i);
-        if (member->state() != SocketMember::StateConnected)
-            continue;
         const quint64 connection = m_connectionSerial.value(i);
         const int timeoutMs = PingTimeoutMs;
         ++m_pingsInFlight;

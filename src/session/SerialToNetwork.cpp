@@ -25,11 +25,7 @@ qint32 packetSize()
 
 bool SessionEngine::anyConnected() const
 {
-    for (int i = 0; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
-        if (m_sockets[size_t(i)]->state() == SocketMember::StateConnected)
-            return true;
-    }
-    return false;
+    return !connectedMembers().isEmpty();
 }
 
 // The members that get serial data: the connected ones, or only the first
@@ -40,12 +36,7 @@ QList<int> SessionEngine::serialReceivers() const
         const int first = firstClientToServe();
         return first >= 0 ? QList<int> { first } : QList<int> {};
     }
-    QList<int> receivers;
-    for (int i = 0; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
-        if (m_sockets[size_t(i)]->state() == SocketMember::StateConnected)
-            receivers << i;
-    }
-    return receivers;
+    return connectedMembers();
 }
 
 int SessionEngine::firstClientToServe() const
@@ -54,11 +45,8 @@ int SessionEngine::firstClientToServe() const
     // stopped sending comes after all others: such a client used to be
     // disconnected at once, and it may well have closed completely.
     int halfClosed = -1;
-    for (int i = 0; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
-        const SocketMember *member = m_sockets[size_t(i)];
-        if (member->state() != SocketMember::StateConnected)
-            continue;
-        if (!member->isHalfClosed())
+    for (const int i : connectedMembers()) {
+        if (!m_sockets[size_t(i)]->isHalfClosed())
             return i;
         if (halfClosed < 0)
             halfClosed = i;

@@ -136,12 +136,20 @@ void SessionEngine::setSettingsLocked(bool locked)
     Q_EMIT settingsLockChanged(locked);
 }
 
+QList<int> SessionEngine::connectedMembers() const
+{
+    QList<int> connected;
+    for (int i = 0; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
+        if (m_sockets[size_t(i)]->state() == SocketMember::StateConnected)
+            connected << i;
+    }
+    return connected;
+}
+
 QStringList SessionEngine::connectedClientAddresses() const
 {
     QStringList addresses;
-    for (int i = 0; i <= m_record.MaxSocketIndex && i < socketCount(); ++i) {
-        if (m_sockets[size_t(i)]->state() == SocketMember::StateConnected)
-            addresses << m_sockets[size_t(i)]->remoteHostIP();
-    }
+    for (const int i : connectedMembers())
+        addresses << m_sockets[size_t(i)]->remoteHostIP();
     return addresses;
 }

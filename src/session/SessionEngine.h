@@ -72,6 +72,8 @@ public:
     // The settings to save, with AutoActivate set while the session runs.
     SessionConfig currentConfiguration() const;
 
+    // Indexes of the connected members, in order: the one walk over them.
+    QList<int> connectedMembers() const;
     // Remote addresses of the connected members, in index order.
     QStringList connectedClientAddresses() const;
 
