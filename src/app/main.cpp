@@ -1,12 +1,13 @@
-#include "DisplayPlatform.h"
-#include "StandardDescriptors.h"
+// velloca: the daemon, the session manager on a core application. With a
+// display it hands over to velloca-desktop.
+#include "DesktopLaunch.h"
+#include "ProgramStart.h"
 
 #include "platform/UnixSignalWatcher.h"
 #include "session/SessionManager.h"
-#include "shell/MainWindow.h"
 
-#include <QApplication>
 #include <QCoreApplication>
+#include <QTextStream>
 #include <QTimer>
 
 namespace {
@@ -14,23 +15,17 @@ namespace {
 constexpr int kStartUpDelayMs = 1000;
 constexpr int kExitDelayMs = 500;
 
-QStringList programArguments(int argc, char **argv)
-{
-    QStringList arguments;
-    for (int i = 1; i < argc; ++i)
-        arguments << QString::fromLocal8Bit(argv[i]);
-    return arguments;
-}
+} // namespace
 
-void nameApplication()
+int main(int argc, char **argv)
 {
-    QCoreApplication::setApplicationName(QStringLiteral("Velloca"));
-    QCoreApplication::setApplicationVersion(QStringLiteral(VELLOCA_VERSION));
-}
-
-// The daemon: the session manager on a core application, nothing else.
-int runHeadless(int argc, char **argv, const QString &commandLine)
-{
+    openMissingStandardDescriptors();
+    if (!chooseHeadless(argc, argv)) {
+        QString error;
+        execDesktopProgram(argv, &error);
+        QTextStream(stderr) << "velloca: " << error << "; running without windows\n";
+    }
+    const QString commandLine = commandLineOf(argc, argv);
     QCoreApplication app(argc, argv);
     nameApplication();
     SessionManager manager;
@@ -57,39 +52,4 @@ int runHeadless(int argc, char **argv, const QString &commandLine)
 
     const int status = app.exec();
     return earlyExitStatus >= 0 ? earlyExitStatus : status;
-}
-
-// The desktop: the same manager with the windows as its views.
-int runDesktop(int argc, char **argv, const QString &commandLine)
-{
-    QApplication app(argc, argv);
-    nameApplication();
-    // Hidden in the tray is not the end: only an exit ends the program.
-    QApplication::setQuitOnLastWindowClosed(false);
-    SessionManager manager;
-    MainWindow window(commandLine, &manager);
-
-    int earlyExitStatus = -1;
-    QObject::connect(&window, &MainWindow::finishedEarly, &app, [&](int status) {
-        earlyExitStatus = status;
-        QApplication::exit(status);
-    });
-    UnixSignalWatcher signalWatcher;
-    QObject::connect(&signalWatcher, &UnixSignalWatcher::terminationRequested, &window, &QWidget::close);
-
-    const int status = app.exec();
-    return earlyExitStatus >= 0 ? earlyExitStatus : status;
-}
-
-} // namespace
-
-int main(int argc, char **argv)
-{
-    openMissingStandardDescriptors();
-    QStringList arguments = programArguments(argc, argv);
-    const bool headless = takeHeadlessChoice(arguments);
-    // The whole command line is one text: a file name with blanks may come
-    // as several arguments.
-    const QString commandLine = arguments.join(u' ');
-    return headless ? runHeadless(argc, argv, commandLine) : runDesktop(argc, argv, commandLine);
 }

@@ -23,7 +23,7 @@ if ! "$cmake" --install "$build" --prefix "$prefix" >"$prefix.log" 2>&1; then
 fi
 rm -f "$prefix.log"
 
-for program in velloca vellocactl; do
+for program in velloca velloca-desktop vellocactl; do
     [ -x "$prefix/bin/$program" ] || fail "bin/$program is missing or not executable"
 done
 for file in share/doc/velloca/manual.html share/doc/velloca/README.md \
