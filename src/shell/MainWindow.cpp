@@ -18,6 +18,8 @@
 #include <QGuiApplication>
 #include <QSystemTrayIcon>
 
+#include <utility>
+
 namespace {
 
 constexpr int kStartUpDelayMs = 1000;
@@ -67,9 +69,11 @@ MainWindow::MainWindow(QString commandLine, SessionManager *manager, QWidget *pa
 
 MainWindow::~MainWindow()
 {
-    // The windows go first: they show engines the manager owns.
+    // The windows go first: they show engines the manager owns. Taken out
+    // of the list first, so their going does not end their sessions.
     m_manager->disconnect(this);
-    for (const QPointer<SessionWindow> &window : std::as_const(m_windows))
+    const auto windows = std::exchange(m_windows, {});
+    for (const QPointer<SessionWindow> &window : windows)
         delete window;
 }
 
