@@ -26,6 +26,15 @@ SessionManager::SessionManager(QObject *parent)
 
 SessionManager::~SessionManager() = default;
 
+QString SessionManager::programPath() const
+{
+    // The desktop program runs beside velloca; what starts at login or as a
+    // service is velloca, which finds the display itself.
+    const QString program = QCoreApplication::applicationFilePath();
+    const QString daemon = QFileInfo(program).absolutePath() + QStringLiteral("/velloca");
+    return program.endsWith(QStringLiteral("/velloca-desktop")) && QFileInfo(daemon).isExecutable() ? daemon : program;
+}
+
 QString SessionManager::virtualPortFolder() const
 {
     const QString &folder = m_loadedDevices.virtualPortFolder;
@@ -141,7 +150,7 @@ bool SessionManager::save(const QString &fileName)
     config.devices = m_loadedDevices;
     config.writeDevices = QFileInfo(path).absoluteFilePath() != QFileInfo(m_loadedConfigPath).absoluteFilePath();
     writeConfiguration(profile, config, writePlacement);
-    if (!SetAutoStart(GlobalOptions::global().LoadWithWindows == 1, QCoreApplication::applicationFilePath(), &error))
+    if (!SetAutoStart(GlobalOptions::global().LoadWithWindows == 1, programPath(), &error))
         qWarning("velloca: autostart entry not changed: %s", qPrintable(error));
     if (!profile.save(path, &error)) {
         reportSaveFailure(error);
@@ -166,7 +175,7 @@ bool SessionManager::handleServiceSwitch(const QString &commandLine)
     const ServiceSwitch serviceSwitch = parseServiceSwitch(commandLine);
     if (serviceSwitch == ServiceSwitch::None)
         return false;
-    const ServiceResult result = runServiceSwitch(serviceSwitch, QCoreApplication::applicationFilePath(), servicePaths);
+    const ServiceResult result = runServiceSwitch(serviceSwitch, programPath(), servicePaths);
     if (result.messageId != 0) {
         QString text = QString::fromLatin1(kServiceDisplayName) + u' ' + LoadResString(result.messageId);
         if (!result.detail.isEmpty())

@@ -89,6 +89,7 @@ private:
     void resetBusInFirstCopy();
     void autoActivate();
     QString virtualPortFolder() const;
+    QString programPath() const;
 
     QList<SessionEngine *> m_sessions;
     QList<int> m_autoActivateList;
