@@ -83,7 +83,7 @@ void SessionEngine::deactivate()
 void SessionEngine::activate()
 {
     // Only a client has a remote host; a server's field is hidden and unused.
-    if (m_settings.TCPOption == 0 && m_settings.IPAddress.isEmpty()) {
+    if (configuredRole() == Role::Client && m_settings.IPAddress.isEmpty()) {
         setStatusLine(NetworkLine, composeStatus(kNetworkCaption, 5088));
         return;
     }
@@ -136,7 +136,7 @@ void SessionEngine::activate()
     }
 
     const int portValue = portNumberValue();
-    if (m_settings.TCPOption == 0) {
+    if (configuredRole() == Role::Client) {
         m_record.TCPOption = 0;
         member->setRemoteHost(m_settings.IPAddress);
         member->setRemotePort(portValue);

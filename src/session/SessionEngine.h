@@ -57,6 +57,9 @@ public:
     void setCommandTopic(const QString &topic);
 
     enum class Activity { Inactive, Active };
+    enum class Role { Client, Server };
+    // The role the settings ask for; the running role is fixed at activation.
+    Role configuredRole() const { return m_settings.TCPOption == 0 ? Role::Client : Role::Server; }
     Activity activity() const { return m_activity; }
     bool isActive() const { return m_activity == Activity::Active; }
     // The Activate button's caption, which follows the activity: "Activate"
