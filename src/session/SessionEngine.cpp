@@ -18,7 +18,6 @@ SessionEngine::SessionEngine(SessionPlatform platform, QObject *parent)
     m_statusLines[NetworkLine] = LoadResString(5091);
     m_caption = LoadResString(5119) + QStringLiteral(" - ") + LoadResString(5120);
     m_commandTopic = SessionLists::connectorName(0);
-    m_activateCaption = LoadResString(5009);
     takeLocalAddress();
 }
 
@@ -119,13 +118,16 @@ void SessionEngine::setCommandTopic(const QString &topic)
 
 void SessionEngine::setActivity(Activity activity)
 {
-    m_activity = activity;
-    // The button offers the opposite of the state.
-    const QString caption = LoadResString(activity == Activity::Active ? 5118 : 5087);
-    if (m_activateCaption == caption)
+    if (m_activity == activity)
         return;
-    m_activateCaption = caption;
-    Q_EMIT activateCaptionChanged(caption);
+    m_activity = activity;
+    Q_EMIT activateCaptionChanged(activateCaption());
+}
+
+QString SessionEngine::activateCaption() const
+{
+    // The button offers the opposite of the state.
+    return LoadResString(isActive() ? 5118 : 5087);
 }
 
 void SessionEngine::setSettingsLocked(bool locked)

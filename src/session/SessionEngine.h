@@ -64,7 +64,7 @@ public:
     bool isActive() const { return m_activity == Activity::Active; }
     // The Activate button's caption, which follows the activity: "Activate"
     // while inactive, "De-Activate" while active.
-    QString activateCaption() const { return m_activateCaption; }
+    QString activateCaption() const;
     bool settingsLocked() const { return m_settingsLocked; }
     void setSettingsLocked(bool locked);
 
@@ -206,7 +206,6 @@ private:
     QString m_statusLines[2];
     QString m_caption;
     QString m_commandTopic;
-    QString m_activateCaption;
     Activity m_activity = Activity::Inactive;
     bool m_settingsLocked = false;
 

@@ -113,6 +113,9 @@ bool SessionManager::load(const QString &fileName, QString *error)
     m_loadedDevices = config.devices;
     m_surplusSessions = config.surplus;
     placement = config.placement;
+    // A file loaded after start-up (File -> Open) is what an exit saves.
+    if (m_startUpDone)
+        m_exitSaveAllowed = m_configurationLock != nullptr;
     GlobalOptions::global() = config.options;
     PortMap::global().clear();
     for (auto it = config.ports.cbegin(); it != config.ports.cend(); ++it)

@@ -55,8 +55,6 @@ public:
     // their old values.
     MainWindowPlacement placement;
     bool writePlacement = true;
-    // A file loaded after start-up (File -> Open) is what an exit saves.
-    void takeOverLoadedFile() { m_exitSaveAllowed = m_configurationLock != nullptr; }
 
     // A service switch on the command line is carried out and ends the
     // program (finished); true when there was one.

@@ -125,8 +125,6 @@ void MainWindow::mnuFileOpen_Click()
         return;
     }
     m_currentConfigFile = *file;
-    // The file that is open now is the one whose sessions an exit saves.
-    m_manager->takeOverLoadedFile();
 }
 
 void MainWindow::mnuFileClose_Click()

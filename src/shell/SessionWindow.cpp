@@ -3,7 +3,6 @@
 
 #include "config/ConfigurationFile.h"
 #include "config/GlobalOptions.h"
-#include "config/SessionOptions.h"
 #include "localisation/ResourceStrings.h"
 #include "platform/LocalAddresses.h"
 #include "platform/SocketMember.h"
@@ -291,12 +290,3 @@ bool SessionWindow::eventFilter(QObject *watched, QEvent *event)
     return QWidget::eventFilter(watched, event);
 }
 
-void SessionWindow::applyConfiguration(const SessionConfig &config)
-{
-    m_engine->applyConfiguration(config);
-}
-
-SessionConfig SessionWindow::currentConfiguration() const
-{
-    return m_engine->currentConfiguration();
-}

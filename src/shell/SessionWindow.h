@@ -10,7 +10,6 @@
 
 class QComboBox;
 class SessionEngine;
-struct SessionConfig;
 namespace Ui { class SessionWindow; }
 
 // The window of one session: shows and edits the engine's settings, shows
@@ -25,11 +24,6 @@ public:
 
     SessionEngine *engine() const { return m_engine; }
 
-    // Puts a session's saved settings into the controls, exactly as a user's
-    // choices would; a list index the list does not have is left alone.
-    void applyConfiguration(const SessionConfig &config);
-    // The settings to save, with AutoActivate set while the session runs.
-    SessionConfig currentConfiguration() const;
 
     // The option dialogs are shown through these hooks: they take the
     // session's options and return them edited, or nothing when cancelled.
